@@ -1,0 +1,25 @@
+#include "errors/tstatus.h"
+
+#include <cstring>
+
+namespace nZRAPALS100 {
+
+void tStatus::merge(std::int32_t newCode, const char* newComponent, const char* newFile, std::uint32_t newLine) noexcept {
+    const bool take = (code == 0 && newCode != 0) || (code > 0 && newCode < 0);
+    if (!take) return;
+    code = newCode;
+    if (size < sizeof(tStatus)) return;
+    std::strncpy(component, newComponent, 9);
+    component[9] = '\0';
+    const std::size_t length = std::strlen(newFile);
+    if (length <= 100) {
+        std::memcpy(file, newFile, length + 1);
+    } else {  // first 49, "..", last 49
+        std::memcpy(file, newFile, 49);
+        std::memcpy(file + 49, "..", 2);
+        std::memcpy(file + 51, newFile + length - 49, 50);
+    }
+    line = newLine;
+}
+
+}  // namespace nZRAPALS100

@@ -1,0 +1,41 @@
+// The operating-system facilities the library uses. Each system has one backend file; nothing
+// outside this folder includes a system header for them.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+namespace platform {
+
+// A lock that must be initialized before use; initialization can fail for lack of memory.
+class Mutex {
+public:
+    Mutex() noexcept = default;
+    Mutex(const Mutex&) = delete;
+    Mutex& operator=(const Mutex&) = delete;
+
+    // 0 on success, else the platform status (-52000 when the system has no memory for it).
+    std::int32_t init() noexcept;
+    void destroy() noexcept;
+    void lock() noexcept;
+    void unlock() noexcept;
+
+private:
+    alignas(16) unsigned char _storage[64];
+};
+
+class LockGuard {
+public:
+    explicit LockGuard(Mutex& mutex) noexcept : _mutex(mutex) { _mutex.lock(); }
+    ~LockGuard() { _mutex.unlock(); }
+    LockGuard(const LockGuard&) = delete;
+    LockGuard& operator=(const LockGuard&) = delete;
+
+private:
+    Mutex& _mutex;
+};
+
+// Hands one whole line to the debug output; lines of concurrent writers never mix.
+void writeDebugOutput(const char* line, std::size_t length) noexcept;
+
+}  // namespace platform

@@ -1,0 +1,232 @@
+#!/usr/bin/env python3
+"""Writes the library's regular code from the tables in src/tables.
+
+operations.tsv feeds the session base class, the call-tracing session and (with exports.tsv)
+the exported functions, the version script and the Windows module definition; statuses.tsv
+feeds the message table."""
+import argparse
+import os
+import re
+
+TRACE_FORMATS = {
+    "ViConstString": "%s", "ViRsrc": "%s", "ViInt32": "%d", "ViUInt32": "%u", "ViAttr": "%u",
+    "ViUInt16": "%hu", "ViBoolean": "%hu", "ViReal64": "%lg", "ViUInt64": "%llu",
+}
+
+
+def read_tsv(path):
+    with open(path, encoding="utf-8") as f:
+        return [line.rstrip("\n").split("\t") for line in f if line.strip() and not line.startswith("#")]
+
+
+def parse_params(text):
+    """'ViInt32 a, ViChar* b' -> [('ViInt32', 'a'), ('ViChar*', 'b')]; '-' -> []."""
+    if text == "-":
+        return []
+    return [tuple(p.strip().rsplit(" ", 1)) for p in text.split(",")]
+
+
+def cpp_type(t):
+    return "std::string&" if t == "text" else t
+
+
+def signature(params, names=True):
+    return ", ".join(cpp_type(t) + (" " + n if names else "") for t, n in params)
+
+
+def load(tables):
+    ops = [dict(slot=int(s), name=n, default=d, params=parse_params(p))
+           for s, n, d, p in read_tsv(os.path.join(tables, "operations.tsv"))]
+    by_name = {op["name"]: op for op in ops}
+    exports = []
+    for ordinal, name, kind, op, params in read_tsv(os.path.join(tables, "exports.tsv")):
+        e = dict(ordinal=ordinal, name=name, kind=kind, op=by_name.get(op))
+        e["params"] = e["op"]["params"] if params == "=" else parse_params(params)
+        exports.append(e)
+    statuses = read_tsv(os.path.join(tables, "statuses.tsv"))
+    return ops, exports, statuses
+
+
+def gen_session_class(ops):
+    decls = "\n".join(f"    virtual void {op['name']}({signature(op['params'])});" for op in ops)
+    header = f"""// Generated from src/tables/operations.tsv: the session interface, one operation per slot.
+#pragma once
+
+#include <string>
+#include <tiktal/tiktal.h>
+
+namespace tiktal {{
+
+class Session {{
+public:
+    Session() = default;
+    Session(const Session&) = delete;
+    Session& operator=(const Session&) = delete;
+    virtual ~Session();
+{decls}
+
+    ViSession id = 0;  // the handle, written once by the registry
+}};
+
+}}  // namespace tiktal
+"""
+    bodies = "\n".join(
+        f"void Session::{op['name']}({signature(op['params'], names=False)}) {{\n"
+        f"    throw ZRERR_RAISE(tiktalerr_{op['default']}).debug(\"func\", \"tiktal::Session::{op['name']}\");\n}}\n"
+        for op in ops if op["default"] != "-")
+    source = f"""// Generated from src/tables/operations.tsv: every operation fails with its slot's status.
+#include "SessionClass.h"
+
+#include "errors/zrerr.h"
+
+namespace tiktal {{
+
+Session::~Session() = default;
+
+{bodies}
+}}  // namespace tiktal
+"""
+    return header, source
+
+
+def trace_param(t, n):
+    if t == "text":
+        fmt, value = "%p", f"static_cast<const void*>(&{n})"
+    elif t.endswith("*"):
+        fmt, value = "%p", f"static_cast<const void*>({n})"
+    elif t == "ViUInt64":
+        fmt, value = "%llu", f"static_cast<unsigned long long>({n})"
+    else:
+        fmt, value = TRACE_FORMATS[t], n
+    return (f"    {{\n        zrsdbg_VarLine v(kFile, __LINE__, \"{n}: \");\n"
+            f"        v.printf(\"%s{fmt}%s\", v.prefix(), {value}, v.suffix());\n    }}\n")
+
+
+def gen_trace_session(ops):
+    traced = [op for op in ops if op["default"] != "-"]
+    decls = "\n".join(f"    void {op['name']}({signature(op['params'])}) override;" for op in traced)
+    header = f"""// Generated from src/tables/operations.tsv: a session that traces every call and does nothing.
+#pragma once
+
+#include "SessionClass.h"
+
+namespace tiktal {{
+
+class SessionDebugPrintOnly final : public Session {{
+public:
+    SessionDebugPrintOnly();
+    ~SessionDebugPrintOnly() override;
+{decls}
+}};
+
+}}  // namespace tiktal
+"""
+    qual = "tiktal::SessionDebugPrintOnly::"
+    bodies = []
+    for op in traced:
+        lines = "".join(trace_param(t, n) for t, n in op["params"])
+        bodies.append(f"void SessionDebugPrintOnly::{op['name']}({signature(op['params'])}) {{\n"
+                      f"    zrsdbg_ScopeLine scope(kFile, __LINE__, \"{qual}{op['name']}\");\n{lines}}}\n")
+    source = f"""// Generated from src/tables/operations.tsv.
+#include "SessionDebugPrintOnly.h"
+
+#include "sessions/trace_line.h"
+
+namespace tiktal {{
+namespace {{
+constexpr const char* kFile = "codegen/SessionDebugPrintOnly";
+}}
+
+SessionDebugPrintOnly::SessionDebugPrintOnly() {{
+    zrsdbg_ScopeLine scope(kFile, __LINE__, "{qual}SessionDebugPrintOnly");
+}}
+
+SessionDebugPrintOnly::~SessionDebugPrintOnly() {{
+    zrsdbg_ScopeLine scope(kFile, __LINE__, "{qual}~SessionDebugPrintOnly");
+}}
+
+{chr(10).join(bodies)}
+}}  // namespace tiktal
+"""
+    return header, source
+
+
+def export_body(e):
+    args = ", ".join(n for _, n in e["op"]["params"]) if e["op"] else ""
+    if e["kind"] == "forward":
+        return f"return tiktal::forward(vi, [&](tiktal::Session& s) {{ s.{e['op']['name']}({args}); }});"
+    if e["kind"] == "text":
+        args = ", ".join("text" if t == "text" else n for t, n in e["op"]["params"])
+        query = "true" if e["name"] == "tiktal_GetTimeReferenceNames" else "false"
+        return (f"return tiktal::forwardText(vi, \"{e['name']}\", bufferSize, valueString, {query},\n"
+                f"        [&](tiktal::Session& s, std::string& text) {{ s.{e['op']['name']}({args}); }});")
+    if e["kind"] == "stub":
+        return "return tiktalerr_featureNotSupported;"
+    return "return VI_SUCCESS;"
+
+
+def gen_exports(exports):
+    defs = []
+    for e in exports:
+        if e["kind"] == "manual":
+            continue
+        used = e["kind"] in ("forward", "text")
+        params = [("ViSession", "vi")] + e["params"]
+        sig = ", ".join(t + (" " + n if used else "") for t, n in params)
+        defs.append(f"ViStatus _VI_FUNC {e['name']}({sig}) {{\n    {export_body(e)}\n}}\n")
+    source = f"""// Generated from src/tables/exports.tsv: the forwarding exports, the stubs, and the exports
+// that return 0.
+#include "api/frame.h"
+
+extern "C" {{
+
+{chr(10).join(defs)}
+}}  // extern "C"
+"""
+    names = [e["name"] for e in exports]
+    version_script = "{\n  global:\n" + "".join(f"    {n};\n" for n in names) + "  local: *;\n};\n"
+    numbered = [e for e in exports if e["ordinal"] != "-"]
+    module_def = "LIBRARY tiktal\nEXPORTS\n" + "".join(f"    {e['name']} @{e['ordinal']}\n" for e in numbered) + \
+        "".join(f"    {e['name']}\n" for e in exports if e["ordinal"] == "-")
+    return source, version_script, module_def, "\n".join(names) + "\n"
+
+
+def c_string(text):
+    return '"' + text.replace("\\", "\\\\").replace('"', '\\"') + '"'
+
+
+def gen_status_table(statuses):
+    rows = "\n".join(f"    {{static_cast<std::int32_t>({code}u), {c_string(name)}, {c_string(msg)}}},"
+                     for code, name, msg in statuses)
+    checks = "\n".join(f"static_assert({name} == static_cast<ViStatus>({code}u), \"{name}\");"
+                       for code, name, _ in statuses)
+    return f"""// Generated from src/tables/statuses.tsv.
+constexpr StatusRow kStatusTable[] = {{
+{rows}
+}};
+{checks}
+"""
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__)
+    parser.add_argument("--tables", required=True)
+    parser.add_argument("--out", required=True)
+    args = parser.parse_args()
+    ops, exports, statuses = load(args.tables)
+    os.makedirs(args.out, exist_ok=True)
+    files = {}
+    files["SessionClass.h"], files["SessionClass.cpp"] = gen_session_class(ops)
+    files["SessionDebugPrintOnly.h"], files["SessionDebugPrintOnly.cpp"] = gen_trace_session(ops)
+    files["apiFunctions.cpp"], files["exports.map"], files["tiktal.def"], files["exports.txt"] = gen_exports(exports)
+    files["statusTable.inc"] = gen_status_table(statuses)
+    for name, text in files.items():
+        path = os.path.join(args.out, name)
+        old = open(path, encoding="utf-8").read() if os.path.exists(path) else None
+        if old != text:
+            with open(path, "w", encoding="utf-8") as f:
+                f.write(text)
+
+
+if __name__ == "__main__":
+    main()
