@@ -6,6 +6,8 @@
 #include <exception>
 #include <type_traits>
 
+#include <tiktal/tiktal.h>
+
 namespace zrerr {
 
 class ExceptionBase;
