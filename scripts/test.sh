@@ -1,0 +1,28 @@
+#!/usr/bin/env bash
+# Builds the library and runs every test: a normal build, a build under AddressSanitizer and
+# UndefinedBehaviorSanitizer, and the concurrency tests under ThreadSanitizer.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+scripts/setup.sh
+
+jobs=$(nproc)
+build() {
+  local dir=$1
+  shift
+  cmake -S . -B "$dir" -G Ninja "$@" >/dev/null
+  cmake --build "$dir" -j "$jobs"
+}
+clang=(-DCMAKE_C_COMPILER=clang -DCMAKE_CXX_COMPILER=clang++ -DTIKTAL_BENCH=OFF)
+
+echo "== build and test"
+build build
+ctest --test-dir build --output-on-failure -j "$jobs"
+
+echo "== AddressSanitizer + UndefinedBehaviorSanitizer"
+build build-asan "${clang[@]}" -DTIKTAL_SANITIZE=address,undefined
+ctest --test-dir build-asan --output-on-failure -j "$jobs"
+
+echo "== ThreadSanitizer (concurrency tests)"
+build build-tsan "${clang[@]}" -DTIKTAL_SANITIZE=thread
+TSAN_OPTIONS="halt_on_error=1" ctest --test-dir build-tsan -L concurrency --output-on-failure
