@@ -1,0 +1,173 @@
+// Helpers of the C-interface tests: the exports of the table, capture of standard error, and
+// call-tracing sessions.
+#pragma once
+
+#include <fcntl.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <optional>
+#include <regex>
+#include <string>
+#include <system_error>
+#include <thread>
+#include <vector>
+
+#include <gtest/gtest.h>
+#include <tiktal/tiktal.h>
+
+namespace capi {
+
+inline constexpr char kTraceResource[] = "SyncTestInternal___";
+inline const std::string kTraced = "tiktal::SessionDebugPrintOnly::";
+
+// Calls `function` with `vi` and every other parameter null or zero.
+template <class... Params>
+ViStatus callWithZeros(ViStatus (*function)(ViSession, Params...), ViSession vi) {
+    return function(vi, Params{}...);
+}
+
+// One row of src/tables/exports.tsv whose function takes the session first.
+struct Export {
+    const char* kind;
+    const char* name;
+    const char* operation;
+    ViStatus (*callWithZeros)(ViSession vi);
+};
+
+inline std::vector<Export> exportsOfKind(const std::string& kind) {
+#define TIKTAL_EXPORT_ROW(kind, name, op) {#kind, #name, op, [](ViSession vi) { return callWithZeros(&name, vi); }},
+#define TIKTAL_EXPORT_manual(name, op)
+#define TIKTAL_EXPORT_forward(name, op) TIKTAL_EXPORT_ROW(forward, name, op)
+#define TIKTAL_EXPORT_text(name, op) TIKTAL_EXPORT_ROW(text, name, op)
+#define TIKTAL_EXPORT_stub(name, op) TIKTAL_EXPORT_ROW(stub, name, op)
+#define TIKTAL_EXPORT_zero(name, op) TIKTAL_EXPORT_ROW(zero, name, op)
+    static const Export all[] = {
+#include "export_calls.inc"
+    };
+    std::vector<Export> found;
+    for (const Export& e : all)
+        if (kind == e.kind) found.push_back(e);
+    return found;
+}
+
+// The forwarding exports: those that run an operation of the session.
+inline std::vector<Export> forwardingExports() {
+    std::vector<Export> all = exportsOfKind("forward");
+    for (const Export& e : exportsOfKind("text")) all.push_back(e);
+    return all;
+}
+
+// Points fd 2 at `fd` until restore() or destruction.
+class Fd2Redirect {
+public:
+    explicit Fd2Redirect(int fd) : _saved(::dup(STDERR_FILENO)) {
+        if (_saved < 0 || ::dup2(fd, STDERR_FILENO) < 0) throw std::system_error(errno, std::generic_category(), "dup");
+    }
+    ~Fd2Redirect() { restore(); }
+    Fd2Redirect(const Fd2Redirect&) = delete;
+    Fd2Redirect& operator=(const Fd2Redirect&) = delete;
+
+    void restore() {
+        if (_saved < 0) return;
+        ::dup2(_saved, STDERR_FILENO);
+        ::close(_saved);
+        _saved = -1;
+    }
+
+private:
+    int _saved;
+};
+
+// Sends fd 2 to /dev/null while alive.
+class QuietStderr {
+public:
+    QuietStderr() : _null(::open("/dev/null", O_WRONLY | O_CLOEXEC)), _redirect(_null) {}
+    ~QuietStderr() {
+        _redirect.restore();
+        ::close(_null);
+    }
+
+private:
+    int _null;
+    Fd2Redirect _redirect;
+};
+
+// Collects what is written to fd 2, one string per write(2): fd 2 is a SOCK_SEQPACKET socket
+// while it is alive, so every write arrives as one message.
+class StderrCapture {
+public:
+    StderrCapture() {
+        int ends[2];
+        if (::socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC, 0, ends) != 0)
+            throw std::system_error(errno, std::generic_category(), "socketpair");
+        _reader = ends[0];
+        _redirect.emplace(ends[1]);
+        ::close(ends[1]);
+        _thread = std::thread([this] {
+            std::vector<char> buffer(1 << 16);
+            for (;;) {
+                const ssize_t n = ::recv(_reader, buffer.data(), buffer.size(), MSG_TRUNC);
+                if (n < 0 && errno == EINTR) continue;
+                if (n <= 0) return;  // the last writing end is closed
+                _writes.emplace_back(buffer.data(), std::min(static_cast<std::size_t>(n), buffer.size()));
+            }
+        });
+    }
+    ~StderrCapture() { finish(); }
+
+    // Restores fd 2 and returns the writes made since the capture began.
+    std::vector<std::string> finish() {
+        _redirect.reset();
+        if (_thread.joinable()) _thread.join();
+        if (_reader >= 0) ::close(_reader);
+        _reader = -1;
+        return std::move(_writes);
+    }
+
+private:
+    int _reader = -1;
+    std::optional<Fd2Redirect> _redirect;
+    std::vector<std::string> _writes;
+    std::thread _thread;
+};
+
+// The messages of trace lines; fails the test for a write that is not exactly one trace line:
+// "[iktal_impl|" + source file right-aligned in 32 characters + "|" + 4-digit line + "] " + message.
+inline std::vector<std::string> traceMessages(const std::vector<std::string>& writes) {
+    static const std::regex kLine(R"(\[iktal_impl\|( *[^ |]+)\|[0-9]{4}\] ([^\n]*)\n)");
+    std::vector<std::string> messages;
+    for (const std::string& write : writes) {
+        std::smatch match;
+        if (std::regex_match(write, match, kLine) && match.length(1) == 32)
+            messages.push_back(match[2]);
+        else
+            ADD_FAILURE() << "not one trace line: \"" << write << '"';
+    }
+    return messages;
+}
+
+// The trace messages written while `calls` runs.
+template <class Calls>
+std::vector<std::string> traceOf(Calls&& calls) {
+    StderrCapture capture;
+    calls();
+    return traceMessages(capture.finish());
+}
+
+// Opens a call-tracing session without showing its trace.
+inline ViSession openTraceSession() {
+    QuietStderr quiet;
+    ViSession vi = 0;
+    EXPECT_EQ(tiktal_init(kTraceResource, VI_FALSE, VI_FALSE, &vi), VI_SUCCESS);
+    return vi;
+}
+
+inline void closeQuietly(ViSession vi) {
+    QuietStderr quiet;
+    EXPECT_EQ(tiktal_close(vi), VI_SUCCESS);
+}
+
+}  // namespace capi
