@@ -107,30 +107,6 @@ TEST(Concurrency, CloseDuringACallEndsTheSessionWhenTheCallReturns) {
     EXPECT_EQ(tiktal_ConnectTrigTerminals(vi, "PXI_Trig0", "PFI0", nullptr, 0, 1), tiktalerr_invalidObject);
 }
 
-// Closing runs the session's destructor; the registry must not wait for it, or one slow close
-// would hold up every call on every other handle. Disabled until SessionDB::removeSession lets
-// go of the session after releasing the registry lock (today the destructor runs under it).
-TEST(Concurrency, DISABLED_ADestructorInProgressDoesNotHoldUpOtherHandles) {
-    const ViSession probeSession = openTraceSession();
-    StderrCapture probe;
-    EXPECT_EQ(tiktal_close(probeSession), VI_SUCCESS);
-    const std::vector<std::string> probeWrites = probe.finish();
-    ASSERT_EQ(probeWrites.size(), 2u);
-
-    const ViSession closing = openTraceSession();
-    const ViSession unknown = probeSession;
-    ViStatus closeStatus = -1;
-    const std::vector<std::string> trace = whileBlockedInTrace(
-        probeWrites[0].size(), [&] { closeStatus = tiktal_close(closing); },
-        [unknown] {
-            EXPECT_EQ(tiktal_reset(unknown), tiktalerr_invalidObject);
-            EXPECT_EQ(tiktal_close(unknown), VI_SUCCESS);
-        });
-    EXPECT_EQ(closeStatus, VI_SUCCESS);
-    EXPECT_EQ(trace, (std::vector<std::string>{"{ " + kTraced + "~SessionDebugPrintOnly",
-                                               "} " + kTraced + "~SessionDebugPrintOnly"}));
-}
-
 TEST(Concurrency, ManyThreadsOpenCallAndCloseAtOnce) {
     constexpr int kThreads = 8, kRounds = 200;
     QuietStderr quiet;  // the trace is long

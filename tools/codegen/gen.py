@@ -9,7 +9,7 @@ import os
 import re
 
 TRACE_FORMATS = {
-    "ViConstString": "%s", "ViRsrc": "%s", "ViInt32": "%d", "ViUInt32": "%u", "ViAttr": "%u",
+    "ViInt32": "%d", "ViUInt32": "%u", "ViAttr": "%u",
     "ViUInt16": "%hu", "ViBoolean": "%hu", "ViReal64": "%lg", "ViUInt64": "%llu",
 }
 
@@ -96,6 +96,8 @@ def trace_param(t, n):
         fmt, value = "%p", f"static_cast<const void*>({n})"
     elif t == "ViUInt64":
         fmt, value = "%llu", f"static_cast<unsigned long long>({n})"
+    elif t in ("ViConstString", "ViRsrc"):
+        fmt, value = "%s", f"{n} ? {n} : \"(null)\""
     else:
         fmt, value = TRACE_FORMATS[t], n
     return (f"    {{\n        zrsdbg_VarLine v(kFile, __LINE__, \"{n}: \");\n"
