@@ -1,51 +1,22 @@
 // Trace lines: the prefix of component, file and line, cutting, and scope lines.
 #include <gtest/gtest.h>
 
-#include <fcntl.h>
-#include <unistd.h>
-
-#include <cstdio>
 #include <stdexcept>
 #include <string>
 #include <vector>
 
 #include "sessions/trace_line.h"
+#include "stderr_capture.h"
 
 namespace {
 
-// Collects what is written to standard error while it lives.
-class StderrCapture {
-public:
-    StderrCapture() : _file(std::tmpfile()), _saved(dup(STDERR_FILENO)) { dup2(fileno(_file), STDERR_FILENO); }
-    ~StderrCapture() {
-        restore();
-        std::fclose(_file);
-    }
-    std::vector<std::string> lines() {
-        restore();
-        std::vector<std::string> out;
-        std::rewind(_file);
-        char buffer[2048];
-        while (std::fgets(buffer, sizeof buffer, _file)) out.emplace_back(buffer);
-        return out;
-    }
-
-private:
-    void restore() {
-        if (_saved < 0) return;
-        dup2(_saved, STDERR_FILENO);
-        close(_saved);
-        _saved = -1;
-    }
-    std::FILE* _file;
-    int _saved;
-};
+using testsupport::StderrCapture;
 
 std::string traced(const char* component, const char* file, int line, const char* message) {
     StderrCapture capture;
     zrsdbg_VarLine(file, line, "", component).printf("%s", message);
-    const auto lines = capture.lines();
-    return lines.size() == 1 ? lines[0] : "<" + std::to_string(lines.size()) + " lines>";
+    const auto writes = capture.finish();
+    return writes.size() == 1 ? writes[0] : "<" + std::to_string(writes.size()) + " writes>";
 }
 
 TEST(TraceLine, PadsOrCutsComponentFileAndLine) {
@@ -73,7 +44,7 @@ TEST(TraceLine, ScopeLinesOpenAndCloseAndTellAnUnwindingScope) {
         throw std::runtime_error("boom");
     } catch (const std::exception&) {
     }
-    const auto lines = capture.lines();
+    const auto lines = capture.finish();
     ASSERT_EQ(lines.size(), 4u);
     EXPECT_EQ(lines[0].substr(51), "{ tiktal::X::op\n");
     EXPECT_EQ(lines[1].substr(51), "} tiktal::X::op\n");
