@@ -63,7 +63,7 @@ private:
     static bool openDebug(ExceptionBase& e) {
         try {
             std::string member;
-            appendQuoted(member, "tiktal_debug");
+            appendQuoted(member, e._debugTag);
             member += ":{}";
             if (!insert(e, member)) return false;
         } catch (...) {
@@ -116,6 +116,7 @@ void ExceptionBase::copyFrom(const ExceptionBase& other) noexcept {
     _code = other._code;
     _accepting = other._accepting;
     _debugOpen = other._debugOpen;
+    _debugTag = other._debugTag;
     _failed = other._failed;
     if (other._text) {
         const std::size_t size = std::strlen(other._text) + 1;
@@ -186,8 +187,9 @@ void ExceptionBase::addUnsigned(const char* key, std::uint64_t value, bool neste
     DetailWriter::add(*this, nested, key, text);
 }
 
-Exception raise(std::int32_t code, const char* constant, const char* file, int line) noexcept {
+Exception raise(std::int32_t code, const char* constant, const char* file, int line, const char* debugTag) noexcept {
     Exception e;
+    e.setDebugTag(debugTag);
     e.setCode(code);
     e.addText("error_constant", constant);
     e.addText("file", file);

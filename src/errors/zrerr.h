@@ -32,11 +32,14 @@ public:
     // The same rule for a whole status: a taken code brings its detail text along.
     void merge(const ExceptionBase& other) noexcept;
 
-    // Members in the order written: of the top-level object, or when `nested` of the object
-    // "tiktal_debug", which the first nested member opens as the last top-level member.
+    // Members in the order written: of the top-level object, or when `nested` of the site's
+    // debug object ("tiktal_debug" unless set), which the first nested member opens as the last
+    // top-level member.
     void addText(const char* key, const char* value, bool nested = false) noexcept;
     void addInteger(const char* key, std::int64_t value, bool nested = false) noexcept;
     void addUnsigned(const char* key, std::uint64_t value, bool nested = false) noexcept;
+
+    void setDebugTag(const char* tag) noexcept { _debugTag = tag; }
 
     static bool defaultGrow(ExceptionBase& self, std::uint32_t size) noexcept;
 
@@ -50,7 +53,8 @@ private:
     friend struct DetailWriter;
     bool _accepting = false;  // the last setCode took its code
     bool _failed = false;     // a write could not grow the buffer: no further members
-    bool _debugOpen = false;  // "tiktal_debug" is the last member and still takes members
+    bool _debugOpen = false;  // the debug object is the last member and still takes members
+    const char* _debugTag = "tiktal_debug";
     void copyFrom(const ExceptionBase& other) noexcept;
 };
 
@@ -81,8 +85,10 @@ public:
     }
 };
 
-// Builds the exception of a raise site: the code and the four standard members.
-Exception raise(std::int32_t code, const char* constant, const char* file, int line) noexcept;
+// Builds the exception of a raise site: the code and the four standard members; site members
+// go into the object named `debugTag`.
+Exception raise(std::int32_t code, const char* constant, const char* file, int line,
+                const char* debugTag = "tiktal_debug") noexcept;
 
 // The library's code for a code of a component below it (routing library, platform layer,
 // time-service client); other codes pass unchanged.

@@ -2,6 +2,8 @@
 #include "platform/platform.h"
 
 #include <cerrno>
+#include <cstdlib>
+#include <dlfcn.h>
 #include <new>
 #include <pthread.h>
 #include <unistd.h>
@@ -39,6 +41,39 @@ void writeDebugOutput(const char* line, std::size_t length) noexcept {
         line += written;
         length -= static_cast<std::size_t>(written);
     }
+}
+
+namespace {
+
+std::string dlerrorText() {
+    const char* text = dlerror();
+    return text ? text : "unknown dynamic loader error";
+}
+
+}  // namespace
+
+void* loadLibrary(const std::string& path, std::string& error) {
+    void* library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+    if (!library) error = dlerrorText();
+    return library;
+}
+
+void* findSymbol(void* library, const char* name, std::string& error) {
+    dlerror();
+    void* symbol = dlsym(library, name);
+    if (!symbol) error = dlerrorText();
+    return symbol;
+}
+
+void unloadLibrary(void* library) noexcept {
+    if (library) dlclose(library);
+}
+
+std::string libraryFileName(const std::string& stem) { return "lib" + stem + ".so"; }
+
+std::string sharedDirectory() {
+    const char* configured = std::getenv("ZRSHAREDDIR");
+    return configured && *configured ? configured : TIKTAL_DEFAULT_SHARED_DIR;
 }
 
 }  // namespace platform

@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <string>
 
 namespace platform {
 
@@ -37,5 +38,16 @@ private:
 
 // Hands one whole line to the debug output; lines of concurrent writers never mix.
 void writeDebugOutput(const char* line, std::size_t length) noexcept;
+
+// Shared libraries loaded at run time. Failures return null and describe themselves in `error`.
+void* loadLibrary(const std::string& path, std::string& error);
+void* findSymbol(void* library, const char* name, std::string& error);
+void unloadLibrary(void* library) noexcept;
+// The file name of the library `stem` on this system ("libstem.so").
+std::string libraryFileName(const std::string& stem);
+
+// The shared installation directory that holds the run-time libraries: $ZRSHAREDDIR when set,
+// else the directory chosen when the library was configured.
+std::string sharedDirectory();
 
 }  // namespace platform

@@ -1,0 +1,62 @@
+#include "json/helpers.h"
+
+#include <boost/lexical_cast.hpp>
+
+#include "errors/zrerr.h"
+#include "json/zrjsonlh.h"
+
+namespace zrjson {
+namespace {
+
+// The member, or null when it is absent (also when the text is no object).
+cJSON* findMember(const zrjsonlh::CppJson& json, const char* name) { return cJSON_GetObjectItem(json.get(), name); }
+
+}  // namespace
+
+bool getStringMember(const std::string& jsonText, const char* name, std::string& out) {
+    const zrjsonlh::CppJson json(jsonText.c_str());
+    const cJSON* member = findMember(json, name);
+    if (!member) return false;
+    if (cJSON_IsNull(member)) return true;
+    if (!cJSON_IsString(member))
+        throw zrerr::raise(zrjsonlh::jsonErrorsTypeMismatch, "errCode", ZRERR_FILE, __LINE__)
+            .debug("message", "Error parsing: expected data type does not match the parsed value.")
+            .debug("key", name)
+            .debug("JSON", jsonText.c_str());
+    out = zrjsonlh::getString(member);
+    return true;
+}
+
+bool getObjectMemberText(const std::string& jsonText, const char* name, std::string& out) {
+    const zrjsonlh::CppJson json(jsonText.c_str());
+    const cJSON* member = findMember(json, name);
+    if (!member) return false;
+    zrjsonlh::checkObject(member);
+    out = zrjsonlh::printUnformatted(member);
+    return true;
+}
+
+bool getStringArrayMember(const std::string& jsonText, const char* name, std::vector<std::string>& out) {
+    const zrjsonlh::CppJson json(jsonText.c_str());
+    const cJSON* member = findMember(json, name);
+    if (!member) return false;
+    if (cJSON_IsNull(member)) return true;
+    std::vector<std::string> texts;
+    for (auto it = zrjsonlh::ArrayIterator::begin(member); it != zrjsonlh::ArrayIterator::end(); ++it)
+        texts.push_back(zrjsonlh::getString(*it));
+    out = std::move(texts);
+    return true;
+}
+
+std::int32_t getInt32Member(const std::string& jsonText, const char* name) {
+    const zrjsonlh::CppJson json(jsonText.c_str());
+    const cJSON* member = findMember(json, name);
+    if (cJSON_IsString(member)) return boost::lexical_cast<std::int32_t>(member->valuestring);
+    if (cJSON_IsNumber(member)) return zrjsonlh::getInt32(member);
+    throw ZRERR_RAISE(tiktalerr_internalSoftware)
+        .debug("message", "Could not cast JSON value to int32 or an JSON object was invalid")
+        .debug("key", name)
+        .debug("JSON", jsonText.c_str());
+}
+
+}  // namespace zrjson

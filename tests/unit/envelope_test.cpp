@@ -1,0 +1,62 @@
+// The in-place scanner of time-service answers.
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include "client/envelope.h"
+
+namespace {
+
+namespace env = zr::vantle::shared::envelope;
+
+TEST(Envelope, WholeTextCheckGivesEachErrorCode) {
+    for (const char* good : {"{}", " [ ] ", R"({"a":[1,-2.5e3,true,false,null,"\u00e9\n"]})", "0", "\"s\"", "\t{\r\n}\n"})
+        EXPECT_EQ(env::check(good), env::kOk) << good;
+    const std::pair<const char*, env::ScanError> bad[] = {
+        {"", env::kInvalidValue},
+        {"   ", env::kInvalidValue},
+        {"<html>", env::kInvalidValue},
+        {"01", env::kTrailingCharacters},
+        {"[1.]", env::kInvalidValue},
+        {"{\"a\":tru}", env::kInvalidValue},
+        {"{a:1}", env::kMalformedString},
+        {"\"abc", env::kMalformedString},
+        {"\"a\tb\"", env::kMalformedString},
+        {"{\"a\":1", env::kObjectNotClosed},
+        {"{\"a\":{\"b\":1}", env::kObjectNotClosed},
+        {"[1,2", env::kArrayNotClosed},
+        {"{\"a\" 1}", env::kMissingColon},
+        {"{\"a\":1 \"b\":2}", env::kUnexpectedCharacter},
+        {"[1 2]", env::kUnexpectedCharacter},
+        {"\"\\x\"", env::kInvalidEscape},
+        {"\"\\u12G4\"", env::kInvalidEscape},
+        {"{\"a\":1,}", env::kTrailingComma},
+        {"[1,]", env::kTrailingComma},
+        {"{} {}", env::kTrailingCharacters},
+    };
+    for (const auto& [text, code] : bad) EXPECT_EQ(env::check(text), code) << text;
+}
+
+TEST(Envelope, FindsMembersByDecodedNameAndReadsValues) {
+    const std::string text = R"( { "x" : {"error":1}, "er\u0072or" : { "success" : true, "errorCode" : -123.9,
+        "errorText" : "a \"quoted\" text" }, "result" :  {"data" : { "k" : [ 1, 2 ] } } } )";
+    const auto error = env::findMember(text, "error");
+    ASSERT_TRUE(error.has_value());
+    const std::string errorText(*env::valueText(text, *error));
+    EXPECT_TRUE(env::readBool(errorText, *env::findMember(errorText, "success")));
+    EXPECT_EQ(env::readNumber(errorText, *env::findMember(errorText, "errorCode")), -123);
+    EXPECT_EQ(env::readString(errorText, *env::findMember(errorText, "errorText")), R"(a \"quoted\" text)");
+    EXPECT_EQ(*env::valueText(text, *env::findMember(text, "result")), R"({"data" : { "k" : [ 1, 2 ] } })");
+    EXPECT_FALSE(env::findMember(text, "Result").has_value());  // exact names
+    EXPECT_FALSE(env::findMember("[1]", "result").has_value());
+    EXPECT_FALSE(env::findMember(R"({"a":1 "result":2})", "result").has_value());  // malformed before it
+
+    const std::string scalars = R"({"t":true,"n":"7","big":1e12,"i":42,"s":5})";
+    EXPECT_FALSE(env::readBool(scalars, *env::findMember(scalars, "n")));
+    EXPECT_EQ(env::readNumber(scalars, *env::findMember(scalars, "n")), 0);
+    EXPECT_EQ(env::readNumber(scalars, *env::findMember(scalars, "i")), 42);
+    EXPECT_EQ(env::readNumber(scalars, *env::findMember(scalars, "big")), 2147483647);
+    EXPECT_EQ(env::readString(scalars, *env::findMember(scalars, "s")), "");
+}
+
+}  // namespace
