@@ -13,7 +13,6 @@
 #include <httplib.h>
 #include <pthread.h>
 #include <signal.h>
-#include <time.h>
 
 #include <atomic>
 #include <cctype>
@@ -346,9 +345,8 @@ private:
         if (epoch) {
             cJSON_AddItemToObject(all.get(), "epochOffsetInNsec", cJSON_Duplicate(epoch, true));
         } else {
-            timespec now{};
-            clock_gettime(CLOCK_REALTIME, &now);
-            const unsigned long long nanos = static_cast<unsigned long long>(now.tv_sec) * 1000000000ULL + now.tv_nsec;
+            const auto now = std::chrono::system_clock::now().time_since_epoch();  // the Unix epoch
+            const long long nanos = std::chrono::duration_cast<std::chrono::nanoseconds>(now).count();
             cJSON_AddStringToObject(all.get(), "epochOffsetInNsec", std::to_string(nanos).c_str());
         }
         for (const char* name : {"apiVersion", "selectedTrId", "selectedTrOffsetNanos"}) {
