@@ -36,10 +36,6 @@ void checkOption(CURLcode code, const char* call) {
 // Sets one option and records the call's text when it fails.
 #define TCURL_SETOPT(option, value, text) checkOption(lib::easySetopt(handle, option, value), text)
 
-struct HeaderListDeleter {
-    void operator()(curl_slist* list) const { lib::slistFreeAll(list); }
-};
-using HeaderList = std::unique_ptr<curl_slist, HeaderListDeleter>;
 
 // The header list and the error buffer live only as long as one request: the handle must not
 // keep pointing at them afterwards, whichever way the request ends.
@@ -104,6 +100,8 @@ std::string unwrap(const std::string& body) {
 
 }  // namespace
 
+void tCURL::HeaderListDeleter::operator()(curl_slist* list) const { lib::slistFreeAll(list); }
+
 tCURL::~tCURL() { lib::easyCleanup(static_cast<CURL*>(_connection)); }
 
 void tCURL::initialize(const std::string& uri, const std::string& prefix, std::uint32_t timeoutInMS) {
@@ -131,7 +129,8 @@ std::string tCURL::put(const std::string& path, const std::string& body) {
     return request(true, path, upload);
 }
 
-void tCURL::setOptions(bool upload, const std::string& url, void* headers, char* errorBuffer, std::string& uploadBuffer) {
+void tCURL::setOptions(bool upload, const std::string& url, HeaderList& headers, char* errorBuffer,
+                       std::string& uploadBuffer) {
     CURL* handle = static_cast<CURL*>(_connection);
     TCURL_SETOPT(CURLOPT_READFUNCTION, readCallback, "curl_easy_setopt(_connection, CURLOPT_READFUNCTION, _readCallback)");
     TCURL_SETOPT(CURLOPT_WRITEFUNCTION, writeCallback,
@@ -147,17 +146,6 @@ void tCURL::setOptions(bool upload, const std::string& url, void* headers, char*
         TCURL_SETOPT(CURLOPT_USERNAME, _username.c_str(), "curl_easy_setopt(_connection, CURLOPT_USERNAME, _username.c_str())");
     if (!_password.empty())
         TCURL_SETOPT(CURLOPT_PASSWORD, _password.c_str(), "curl_easy_setopt(_connection, CURLOPT_PASSWORD, _password.c_str())");
-    if (headers)
-        TCURL_SETOPT(CURLOPT_HTTPHEADER, headers, "curl_easy_setopt(_connection, CURLOPT_HTTPHEADER, headerList.get())");
-    TCURL_SETOPT(CURLOPT_ERRORBUFFER, errorBuffer, "curl_easy_setopt(_connection, CURLOPT_ERRORBUFFER, errbuf)");
-}
-
-std::string tCURL::request(bool upload, const std::string& path, std::string& uploadBuffer) {
-    tempBufferForGet.clear();
-    if (_uri.empty()) throw TCURL_RAISE(kInvalidEndStationURI).debug("check failed", "!_uri.empty()");
-    if (_prefix.empty()) throw TCURL_RAISE(kInvalidURIPrefix).debug("check failed", "!_prefix.empty()");
-
-    HeaderList headers;
     const auto addHeader = [&headers](const std::string& name, const std::string& value) {
         if (value.empty()) return;
         curl_slist* list = lib::slistAppend(headers.get(), (name + value).c_str());
@@ -167,10 +155,21 @@ std::string tCURL::request(bool upload, const std::string& path, std::string& up
     };
     addHeader("Accept: ", _acceptType);
     addHeader("Content-Type: ", _contentType);
-    char errorBuffer[CURL_ERROR_SIZE] = {};
+    if (headers)
+        TCURL_SETOPT(CURLOPT_HTTPHEADER, headers.get(), "curl_easy_setopt(_connection, CURLOPT_HTTPHEADER, headerList.get())");
+    TCURL_SETOPT(CURLOPT_ERRORBUFFER, errorBuffer, "curl_easy_setopt(_connection, CURLOPT_ERRORBUFFER, errbuf)");
+}
+
+std::string tCURL::request(bool upload, const std::string& path, std::string& uploadBuffer) {
+    tempBufferForGet.clear();
+    if (_uri.empty()) throw TCURL_RAISE(kInvalidEndStationURI).debug("check failed", "!_uri.empty()");
+    if (_prefix.empty()) throw TCURL_RAISE(kInvalidURIPrefix).debug("check failed", "!_prefix.empty()");
+
     CURL* handle = static_cast<CURL*>(_connection);
+    HeaderList headers;
+    char errorBuffer[CURL_ERROR_SIZE] = {};
     const RequestScope scope(handle);
-    setOptions(upload, _uri + "/" + _prefix + "/" + path, headers.get(), errorBuffer, uploadBuffer);
+    setOptions(upload, _uri + "/" + _prefix + "/" + path, headers, errorBuffer, uploadBuffer);
 
     const CURLcode performed = lib::easyPerform(handle);
     if (performed != CURLE_OK)

@@ -3,7 +3,10 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
 #include <string>
+
+struct curl_slist;
 
 namespace zr::vantle::shared {
 
@@ -48,8 +51,14 @@ public:
     std::string get(const std::string& path) override;
 
 private:
+    struct HeaderListDeleter {
+        void operator()(curl_slist* list) const;
+    };
+    using HeaderList = std::unique_ptr<curl_slist, HeaderListDeleter>;
+
     std::string request(bool upload, const std::string& path, std::string& uploadBuffer);
-    void setOptions(bool upload, const std::string& url, void* headers, char* errorBuffer, std::string& uploadBuffer);
+    void setOptions(bool upload, const std::string& url, HeaderList& headers, char* errorBuffer,
+                    std::string& uploadBuffer);
 
     void* _connection = nullptr;
     std::string tempBufferForGet;
