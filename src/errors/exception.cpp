@@ -187,6 +187,15 @@ void ExceptionBase::addUnsigned(const char* key, std::uint64_t value, bool neste
     DetailWriter::add(*this, nested, key, text);
 }
 
+void ExceptionBase::addDetail(const char* key, const ExceptionBase& other, bool nested) noexcept {
+    if (!other._text) return;
+    try {
+        DetailWriter::add(*this, nested, key, other._text);
+    } catch (...) {
+        _failed = true;
+    }
+}
+
 Exception raise(std::int32_t code, const char* constant, const char* file, int line, const char* debugTag) noexcept {
     Exception e;
     e.setDebugTag(debugTag);

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <exception>
+#include <string>
 #include <type_traits>
 
 #include <tiktal/tiktal.h>
@@ -38,6 +39,8 @@ public:
     void addText(const char* key, const char* value, bool nested = false) noexcept;
     void addInteger(const char* key, std::int64_t value, bool nested = false) noexcept;
     void addUnsigned(const char* key, std::uint64_t value, bool nested = false) noexcept;
+    // A member whose value is the detail text of another status (nothing when it has none).
+    void addDetail(const char* key, const ExceptionBase& other, bool nested = false) noexcept;
 
     void setDebugTag(const char* tag) noexcept { _debugTag = tag; }
 
@@ -73,6 +76,12 @@ public:
     // Site members, written into "tiktal_debug".
     Exception& debug(const char* key, const char* value) noexcept {
         addText(key, value, true);
+        return *this;
+    }
+    Exception& debug(const char* key, const std::string& value) noexcept { return debug(key, value.c_str()); }
+    // The status this one replaces, kept as a nested detail.
+    Exception& cause(const ExceptionBase& other) noexcept {
+        addDetail("nested_error", other, true);
         return *this;
     }
     template <class T, class = std::enable_if_t<std::is_integral_v<T>>>

@@ -11,20 +11,38 @@ namespace {
 // The member, or null when it is absent (also when the text is no object).
 cJSON* findMember(const zrjsonlh::CppJson& json, const char* name) { return cJSON_GetObjectItem(json.get(), name); }
 
-}  // namespace
-
-bool getStringMember(const std::string& jsonText, const char* name, std::string& out) {
+// The member readers: false when absent, true and `out` untouched when null; a value of another
+// type fails with -52004 naming the text and the key.
+template <class Value>
+bool readMember(const std::string& jsonText, const char* name, Value& out, cJSON_bool (*hasType)(const cJSON*),
+                Value (*convert)(const cJSON*)) {
     const zrjsonlh::CppJson json(jsonText.c_str());
     const cJSON* member = findMember(json, name);
     if (!member) return false;
     if (cJSON_IsNull(member)) return true;
-    if (!cJSON_IsString(member))
+    if (!hasType(member))
         throw zrerr::raise(zrjsonlh::jsonErrorsTypeMismatch, "errCode", ZRERR_FILE, __LINE__)
             .debug("message", "Error parsing: expected data type does not match the parsed value.")
-            .debug("key", name)
-            .debug("JSON", jsonText.c_str());
-    out = zrjsonlh::getString(member);
+            .debug("JSON", jsonText.c_str())
+            .debug("key", name);
+    out = convert(member);
     return true;
+}
+
+bool toBool(const cJSON* item) { return cJSON_IsTrue(item); }
+
+}  // namespace
+
+bool getStringMember(const std::string& jsonText, const char* name, std::string& out) {
+    return readMember(jsonText, name, out, cJSON_IsString, zrjsonlh::getString);
+}
+
+bool getInt32NumberMember(const std::string& jsonText, const char* name, std::int32_t& out) {
+    return readMember(jsonText, name, out, cJSON_IsNumber, zrjsonlh::getInt32);
+}
+
+bool getBoolMember(const std::string& jsonText, const char* name, bool& out) {
+    return readMember(jsonText, name, out, cJSON_IsBool, toBool);
 }
 
 bool getObjectMemberText(const std::string& jsonText, const char* name, std::string& out) {

@@ -3,7 +3,7 @@
 
 operations.tsv feeds the session base class, the call-tracing session and (with exports.tsv)
 the exported functions, the version script and the Windows module definition; statuses.tsv
-feeds the message table."""
+feeds the message table; attributes.tsv the time-service attribute dictionary."""
 import argparse
 import os
 import re
@@ -210,6 +210,24 @@ constexpr StatusRow kStatusTable[] = {{
 """
 
 
+def gen_attribute_dictionary(tables):
+    rows = read_tsv(os.path.join(tables, "attributes.tsv"))
+    with open(os.path.join(tables, "attributes.tsv"), encoding="utf-8") as f:
+        types = [line.rstrip("\n").split("\t")[4:] for line in f if line.startswith("# identifier")][0]
+    records = []
+    for identifier, constant, value_type, active, *keys in rows:
+        present = [(t, "" if k == '""' else k) for t, k in zip(types, keys) if k != "-"]
+        entries = ", ".join(f'{{"{t}", {c_string(k)}}}' for t, k in present)
+        records.append(f"    {{{constant}, {{{'true' if active == 'required' else 'false'}, AttrValueType::{value_type}, {{{entries}}}}}}},")
+    checks = "\n".join(f"static_assert({c} == {i}u, \"{c}\");" for i, c, *_ in rows)
+    return f"""// Generated from src/tables/attributes.tsv.
+const std::unordered_map<ViAttr, ApiAttrData> kHorloApiAttrDict = {{
+{chr(10).join(records)}
+}};
+{checks}
+"""
+
+
 def main():
     parser = argparse.ArgumentParser(description=__doc__)
     parser.add_argument("--tables", required=True)
@@ -222,6 +240,7 @@ def main():
     files["SessionDebugPrintOnly.h"], files["SessionDebugPrintOnly.cpp"] = gen_trace_session(ops)
     files["apiFunctions.cpp"], files["exports.map"], files["tiktal.def"], files["exports.txt"] = gen_exports(exports)
     files["statusTable.inc"] = gen_status_table(statuses)
+    files["HorloApiAttrDict.inc"] = gen_attribute_dictionary(args.tables)
     for name, text in files.items():
         path = os.path.join(args.out, name)
         old = open(path, encoding="utf-8").read() if os.path.exists(path) else None

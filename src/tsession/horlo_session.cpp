@@ -1,0 +1,208 @@
+// Construction of a time-service session and its attribute operations.
+#include "tsession/horlo_session.h"
+
+#include <algorithm>
+#include <boost/lexical_cast.hpp>
+#include <iterator>
+
+#include "client/horlo_uri.h"
+#include "client/remote_client.h"
+#include "errors/zrerr.h"
+#include "json/helpers.h"
+#include "tsession/enums.h"
+
+namespace tiktal {
+namespace {
+
+using Lock = std::lock_guard<std::mutex>;
+
+constexpr char kMissingParameter[] = "Encountered missing parameter needed for task completion.";
+constexpr char kParseFailure[] = "Failed to parse attribute from Horlo metadata.";
+const char* const kEnableableTypes[] = {"IEEE 802.1AS-2011", "IEEE 1588-2008", "IEEE 802.1AS-2011 TAB", "IEEE 1588-2008 BC"};
+
+void requireOutput(const void* value) {
+    if (!value) throw ZRERR_RAISE(tiktalerr_invParameter).debug("message", kMissingParameter).debug("value", "NULL");
+}
+
+[[noreturn]] void missingMember(const std::string& json, const std::string& key, const char* message = kParseFailure) {
+    throw ZRERR_RAISE(tiktalerr_internalSoftware).debug("message", message).debug("json", json).debug("key", key);
+}
+
+bool isPtpAccuracy(ViAttr a) { return a == TIKTAL_ATTR_1588_CLOCK_ACCURACY || a == TIKTAL_ATTR_1588_GM_CLOCK_ACCURACY; }
+bool is8021asAccuracy(ViAttr a) { return a == TIKTAL_ATTR_8021AS_CLOCK_ACCURACY || a == TIKTAL_ATTR_8021AS_GM_CLOCK_ACCURACY; }
+
+std::unique_ptr<zrhorlo::RemoteClientApiWrapper> connect(const std::string& resourceName) {
+    const horloUtils::HorloUri uri(resourceName);
+    try {
+        const std::string host = uri.getHost();
+        if (host == "localhost" || host == "127.0.0.1")
+            throw ZRERR_RAISE(tiktalerr_deviceNotFound).debug("func", "tiktal::HorloSession::HorloSession");
+        return std::make_unique<zrhorlo::RemoteClientApiWrapper>(host, uri.getDeviceName());
+    } catch (const zrerr::ExceptionBase& e) {
+        if (e.code() != -52005) throw;
+        throw ZRERR_RAISE(tiktalerr_libLoadFailure).debug("func", "tiktal::HorloSession::HorloSession").cause(e);
+    }
+}
+
+}  // namespace
+
+std::unique_ptr<Session> createHorloSession(const char* resourceName) { return std::make_unique<HorloSession>(resourceName); }
+
+HorloSession::HorloSession(const char* resourceName) : resourceName(resourceName), client(connect(this->resourceName)) {}
+
+HorloSession::~HorloSession() = default;
+
+std::string HorloSession::getMetaDataKey(ViConstString terminalName, ViAttr attribute, AttrValueType valueType) {
+    const ApiAttrData& record = getAttrData(attribute);
+    std::string trType;
+    if (record.verifyActiveItemProvided(terminalName)) {
+        trType = getTrType(terminalName);
+        record.verifyAttrValidForTimeRef(trType);
+    }
+    if (record.valueType != valueType) record.verifyAttrValidForFunction();
+    return record.getMetaDataAttrKey(trType);
+}
+
+std::string HorloSession::getTrAttr(ViConstString terminalName, const std::string& key) {
+    if (!terminalName) throw ZRERR_RAISE(tiktalerr_terminalNotSpecified).debug("func", "tiktal::HorloSession::getTrAttr");
+    std::string json;
+    client->getTrAttr(terminalName, key, &json);
+    return json;
+}
+
+std::string HorloSession::getTrType(ViConstString trName) {
+    const std::string json = getTrAttr(trName, "type");
+    std::string type;
+    if (!zrjson::getStringMember(json, "type", type))
+        missingMember(json, "type", "Failed to parse time reference type from Horlo metadata.");
+    return type;
+}
+
+std::string HorloSession::getSelectedTrId() {
+    std::string name;
+    client->getSelectedTrId(&name);
+    return name;
+}
+
+std::int64_t HorloSession::getSelectedTrOffsetNanos() {
+    std::int64_t nanos = 0;
+    client->getSelectedTrOffsetNanos(&nanos);
+    return nanos;
+}
+
+std::string HorloSession::getSelectedTrType() {
+    const std::string selected = getSelectedTrId();
+    return selected.empty() ? std::string() : getTrType(selected.c_str());
+}
+
+std::string HorloSession::readTrAttrText(ViConstString terminalName, const std::string& key) {
+    const std::string json = getTrAttr(terminalName, key);
+    std::string text;
+    if (!zrjson::getStringMember(json, key.c_str(), text)) missingMember(json, key);
+    return text;
+}
+
+void HorloSession::writeTrAttr(ViConstString terminalName, const std::string& key, const std::string& valueText) {
+    if (!terminalName) throw ZRERR_RAISE(tiktalerr_terminalNotSpecified).debug("func", "tiktal::HorloSession::writeTrAttr");
+    client->setTrAttr(terminalName, key, valueText);
+}
+
+void HorloSession::getAttributeViString(ViConstString terminalName, ViAttr attribute, std::string& valueString) {
+    const Lock hold(_lock);
+    const std::string key = getMetaDataKey(terminalName, attribute, AttrValueType::String);
+    if (attribute == TIKTAL_ATTR_SELECTED_TIME_REFERENCE_TYPE)
+        valueString = getSelectedTrType();
+    else if (attribute == TIKTAL_ATTR_SELECTED_TIME_REFERENCE)
+        valueString = getSelectedTrId();
+    else
+        valueString = readTrAttrText(terminalName, key);
+}
+
+void HorloSession::getAttributeViInt32(ViConstString terminalName, ViAttr attribute, ViInt32* value) {
+    requireOutput(value);
+    const Lock hold(_lock);
+    const std::string key = getMetaDataKey(terminalName, attribute, AttrValueType::Int32);
+    if (attribute == TIKTAL_ATTR_1588_PORT_STATE) {
+        *value = getPtpPortStateEnumFromString(readTrAttrText(terminalName, key));
+    } else if (attribute == TIKTAL_ATTR_8021AS_PORT_STATE) {
+        *value = get8021asPortStateEnumFromString(readTrAttrText(terminalName, key));
+    } else if (attribute == TIKTAL_ATTR_1588_BMCA_MODE) {
+        *value = getBmcaModeEnumFromString(readTrAttrText(terminalName, key));
+    } else if (isPtpAccuracy(attribute)) {
+        const std::uint8_t code = getClockAccuracyCodeFromString(readTrAttrText(terminalName, key));
+        *value = code == 0xFE ? 0 : code - 31;
+    } else if (is8021asAccuracy(attribute)) {
+        const std::string json = getTrAttr(terminalName, key);
+        std::string text;
+        try {
+            if (!zrjson::getStringMember(json, key.c_str(), text)) missingMember(json, key);
+            *value = getClockAccuracyCodeFromString(text);
+        } catch (const zrerr::ExceptionBase& e) {
+            if (e.code() != -52004) throw;
+            zrjson::getInt32NumberMember(json, key.c_str(), *value);  // the service sent the code as a number
+        }
+    } else if (attribute == TIKTAL_ATTR_8021AS_NEIGHBOR_PROP_DELAY_THRESHOLD) {
+        *value = zrjson::getInt32Member(getTrAttr(terminalName, key), key.c_str());
+    } else {
+        const std::string json = getTrAttr(terminalName, key);
+        if (!zrjson::getInt32NumberMember(json, key.c_str(), *value)) missingMember(json, key);
+    }
+}
+
+void HorloSession::getAttributeViReal64(ViConstString terminalName, ViAttr attribute, ViReal64* value) {
+    requireOutput(value);
+    const Lock hold(_lock);
+    const std::string key = getMetaDataKey(terminalName, attribute, AttrValueType::Real64);
+    if (attribute == TIKTAL_ATTR_SELECTED_TIME_REFERENCE_OFFSET) {
+        *value = static_cast<double>(getSelectedTrOffsetNanos()) / 1000000000.0;
+    } else if (attribute == TIKTAL_ATTR_SELECTED_TIME_REFERENCE_OFFSET_NS) {
+        *value = static_cast<double>(getSelectedTrOffsetNanos());
+    } else {
+        const std::string json = getTrAttr(terminalName, key);
+        std::string text;
+        if (!zrjson::getStringMember(json, key.c_str(), text)) missingMember(json, key);
+        *value = boost::lexical_cast<double>(text);
+    }
+}
+
+void HorloSession::getAttributeViBoolean(ViConstString terminalName, ViAttr attribute, ViBoolean* value) {
+    requireOutput(value);
+    const Lock hold(_lock);
+    const std::string key = getMetaDataKey(terminalName, attribute, AttrValueType::Boolean);
+    if (attribute == TIKTAL_ATTR_TIME_REFERENCE_SELECTED) {
+        // A listed name, whole: a name that is only part of another one names nothing.
+        const std::string names = "," + timeReferenceNames() + ",";
+        if (names.find("," + std::string(terminalName) + ",") == std::string::npos)
+            throw ZRERR_RAISE(tiktalerr_trInstanceNotFound).debug("func", "tiktal::HorloSession::getAttributeViBoolean");
+        *value = getSelectedTrId() == terminalName ? VI_TRUE : VI_FALSE;
+        return;
+    }
+    const std::string json = getTrAttr(terminalName, key);
+    bool flag = false;  // a null member reads false
+    if (!zrjson::getBoolMember(json, key.c_str(), flag)) missingMember(json, key);
+    *value = flag ? VI_TRUE : VI_FALSE;
+}
+
+void HorloSession::setAttributeViString(ViConstString terminalName, ViAttr attribute, ViConstString value) {
+    if (!value) throw ZRERR_RAISE(tiktalerr_invParameter).debug("message", kMissingParameter).debug("value", "NULL");
+    const Lock hold(_lock);
+    writeTrAttr(terminalName, getMetaDataKey(terminalName, attribute, AttrValueType::String), value);
+}
+
+void HorloSession::setAttributeViInt32(ViConstString terminalName, ViAttr attribute, ViInt32 value) {
+    const Lock hold(_lock);
+    const std::string key = getMetaDataKey(terminalName, attribute, AttrValueType::Int32);
+    writeTrAttr(terminalName, key,
+                attribute == TIKTAL_ATTR_1588_BMCA_MODE ? getBmcaModeStringFromEnum(value) : std::to_string(value));
+}
+
+void HorloSession::setAttributeViBoolean(ViConstString terminalName, ViAttr attribute, ViBoolean value) {
+    const Lock hold(_lock);
+    const std::string key = getMetaDataKey(terminalName, attribute, AttrValueType::Boolean);
+    const std::string type = getTrType(terminalName);
+    if (key == "isEnabled" && std::find(std::begin(kEnableableTypes), std::end(kEnableableTypes), type) == std::end(kEnableableTypes))
+        throw ZRERR_RAISE(tiktalerr_attrReadonly).debug("func", "tiktal::HorloSession::setAttributeViBoolean");
+    writeTrAttr(terminalName, key, std::to_string(value));
+}
+
+}  // namespace tiktal

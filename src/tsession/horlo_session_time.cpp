@@ -1,0 +1,85 @@
+// Time references, time, persistence and the operations a time service refuses.
+#include <boost/lexical_cast.hpp>
+
+#include "client/remote_client.h"
+#include "errors/zrerr.h"
+#include "json/helpers.h"
+#include "json/zrjsonlh.h"
+#include "tsession/horlo_session.h"
+
+namespace tiktal {
+namespace {
+
+using Lock = std::lock_guard<std::mutex>;
+constexpr std::uint64_t kNanosPerSecond = 1000000000;
+
+}  // namespace
+
+std::string HorloSession::timeReferenceNames() {
+    std::string json;
+    client->getSvcAttr("allTimeReferences", &json);
+    const zrjsonlh::CppJson parsed(json.c_str());
+    const cJSON* names = zrjsonlh::getObjectItem(parsed.get(), "allTimeReferences");
+    std::string joined;
+    const int count = cJSON_IsArray(names) ? cJSON_GetArraySize(names) : 0;  // a scalar has no elements
+    for (int i = 0; i < count; ++i) {
+        if (i > 0) joined += ',';
+        joined += zrjsonlh::getString(zrjsonlh::getArrayItem(names, static_cast<std::uint32_t>(i)));
+    }
+    return joined;
+}
+
+void HorloSession::getTimeReferenceNames(std::string& valueString) {
+    const Lock hold(_lock);
+    valueString = timeReferenceNames();
+}
+
+void HorloSession::getTime(ViUInt32* timeSeconds, ViUInt32* timeNanoseconds, ViUInt16* timeFractionalNanoseconds) {
+    if (!timeSeconds || !timeNanoseconds || !timeFractionalNanoseconds)
+        throw ZRERR_RAISE(tiktalerr_invParameter)
+            .debug("message", "Encountered missing parameter needed for task completion.")
+            .debug("func", "tiktal::HorloSession::getTime");
+    const Lock hold(_lock);
+    std::string json, text;
+    client->getSvcAttr("epochOffsetInNsec", &json);
+    if (!zrjson::getStringMember(json, "epochOffsetInNsec", text))
+        throw ZRERR_RAISE(tiktalerr_internalSoftware)
+            .debug("message", "Failed to parse attribute from Horlo metadata.")
+            .debug("json", json)
+            .debug("key", "epochOffsetInNsec");
+    const std::uint64_t nanos = boost::lexical_cast<std::uint64_t>(text);  // "-n" wraps modulo 2^64
+    const std::uint64_t seconds = nanos / kNanosPerSecond;
+    if (seconds > 4294967295u) throw ZRERR_RAISE(tiktalerr_overflow).debug("func", "tiktal::HorloSession::getTime");
+    *timeSeconds = static_cast<ViUInt32>(seconds);
+    *timeNanoseconds = static_cast<ViUInt32>(nanos - seconds * kNanosPerSecond);
+    *timeFractionalNanoseconds = 0;
+}
+
+void HorloSession::adjustTimeBeta(ViUInt64 timeReferenceNanos, ViUInt64 timeKeeperNanos) {
+    const Lock hold(_lock);
+    const ViStatus status = client->adjustTime(timeReferenceNanos, timeKeeperNanos);
+    if (status != VI_SUCCESS)
+        throw zrerr::raise(status, "retVal", ZRERR_FILE, __LINE__).debug("message", "Adjust Time call failed");
+}
+
+void HorloSession::persistConfig() {
+    const Lock hold(_lock);
+    client->persistConfig();
+}
+
+void HorloSession::reset() {
+    const Lock hold(_lock);
+    client->restartSvc();
+}
+
+void HorloSession::bringDownSvc() {
+    const Lock hold(_lock);
+    client->bringDownSvc();
+}
+
+void HorloSession::bringUpSvc() {
+    const Lock hold(_lock);
+    client->bringUpSvc();
+}
+
+}  // namespace tiktal
