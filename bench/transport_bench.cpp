@@ -1,11 +1,15 @@
-// One GET round trip to the time-service simulator: through the transport (loaded HTTP library,
-// envelope check and unwrapping) against a plain libcurl easy-handle loop on the same URL.
+// Round trips to the time-service simulator, each beside a plain libcurl easy-handle loop on the
+// same URLs: one GET through the transport (loaded HTTP library, envelope check, unwrapping), and
+// an Int32 attribute read through the C interface (two requests: the type, then the value).
 #include <benchmark/benchmark.h>
 #include <curl/curl.h>
 
 #include <cstdlib>
 #include <memory>
 #include <string>
+#include <vector>
+
+#include <tiktal/tiktal.h>
 
 #include "client/curl.h"
 #include "timeservice_sim.h"
@@ -27,28 +31,48 @@ size_t collect(char* data, size_t size, size_t count, void* user) {
     return size * count;
 }
 
-void PlainLibcurlGet(benchmark::State& state) {
+// GETs of `paths` (under /tiktalwebs/) in turn on one easy handle, each iteration all of them.
+void plainGets(benchmark::State& state, const std::vector<std::string>& paths) {
     CURL* handle = curl_easy_init();
     curl_slist* headers = curl_slist_append(nullptr, "Accept: vnd.zr.tiktal.v1/json; charset=utf-8");
     headers = curl_slist_append(headers, "Content-Type: vnd.zr.tiktal.v1/json; charset=utf-8");
-    const std::string url = gSim->url(std::string("/tiktalwebs/") + kPath);
     std::string body;
-    curl_easy_setopt(handle, CURLOPT_URL, url.c_str());
     curl_easy_setopt(handle, CURLOPT_HTTPHEADER, headers);
     curl_easy_setopt(handle, CURLOPT_WRITEFUNCTION, collect);
     curl_easy_setopt(handle, CURLOPT_WRITEDATA, &body);
     curl_easy_setopt(handle, CURLOPT_NOSIGNAL, 1L);
     for (auto _ : state) {
-        body.clear();
-        curl_easy_perform(handle);
-        benchmark::DoNotOptimize(body);
+        for (const std::string& path : paths) {
+            const std::string url = gSim->url("/tiktalwebs/" + path);
+            curl_easy_setopt(handle, CURLOPT_URL, url.c_str());
+            body.clear();
+            curl_easy_perform(handle);
+            benchmark::DoNotOptimize(body);
+        }
     }
     curl_slist_free_all(headers);
     curl_easy_cleanup(handle);
 }
 
+void PlainLibcurlGet(benchmark::State& state) { plainGets(state, {kPath}); }
+
+void SessionGetAttributeViInt32(benchmark::State& state) {
+    ViSession vi = 0;
+    if (tiktal_init(gSim->resource().c_str(), VI_FALSE, VI_FALSE, &vi) != VI_SUCCESS) {
+        state.SkipWithError("tiktal_init failed");
+        return;
+    }
+    ViInt32 value = 0;
+    for (auto _ : state) benchmark::DoNotOptimize(tiktal_GetAttributeViInt32(vi, "PTP1", TIKTAL_ATTR_1588_PRIORITY1, &value));
+    tiktal_close(vi);
+}
+
+void PlainLibcurlTypeThenValue(benchmark::State& state) { plainGets(state, {"sync_1/PTP1/type", "sync_1/PTP1/priority1"}); }
+
 BENCHMARK(TransportGet)->UseRealTime();
 BENCHMARK(PlainLibcurlGet)->UseRealTime();
+BENCHMARK(SessionGetAttributeViInt32)->UseRealTime();
+BENCHMARK(PlainLibcurlTypeThenValue)->UseRealTime();
 
 }  // namespace
 
