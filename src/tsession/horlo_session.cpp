@@ -170,9 +170,9 @@ void HorloSession::getAttributeViBoolean(ViConstString terminalName, ViAttr attr
     const Lock hold(_lock);
     const std::string key = getMetaDataKey(terminalName, attribute, AttrValueType::Boolean);
     if (attribute == TIKTAL_ATTR_TIME_REFERENCE_SELECTED) {
-        // A listed name, whole: a name that is only part of another one names nothing.
-        const std::string names = "," + timeReferenceNames() + ",";
-        if (names.find("," + std::string(terminalName) + ",") == std::string::npos)
+        // One of the listed names, whole: a part of a name, or several joined, names nothing.
+        const std::vector<std::string> names = timeReferenceNames();
+        if (std::find(names.begin(), names.end(), terminalName) == names.end())
             throw ZRERR_RAISE(tiktalerr_trInstanceNotFound).debug("func", "tiktal::HorloSession::getAttributeViBoolean");
         *value = getSelectedTrId() == terminalName ? VI_TRUE : VI_FALSE;
         return;

@@ -6,6 +6,7 @@
 #include <memory>
 #include <mutex>
 #include <string>
+#include <vector>
 
 #include "sessions/session.h"
 #include "tsession/attr_dict.h"
@@ -46,7 +47,7 @@ private:
     std::string getTrAttr(ViConstString terminalName, const std::string& key);
     std::string readTrAttrText(ViConstString terminalName, const std::string& key);
     void writeTrAttr(ViConstString terminalName, const std::string& key, const std::string& valueText);
-    std::string timeReferenceNames();
+    std::vector<std::string> timeReferenceNames();
 
     std::string resourceName;
     std::unique_ptr<zrhorlo::RemoteClientApiWrapper> client;

@@ -15,23 +15,24 @@ constexpr std::uint64_t kNanosPerSecond = 1000000000;
 
 }  // namespace
 
-std::string HorloSession::timeReferenceNames() {
+std::vector<std::string> HorloSession::timeReferenceNames() {
     std::string json;
     client->getSvcAttr("allTimeReferences", &json);
     const zrjsonlh::CppJson parsed(json.c_str());
     const cJSON* names = zrjsonlh::getObjectItem(parsed.get(), "allTimeReferences");
-    std::string joined;
+    std::vector<std::string> list;
     const int count = cJSON_IsArray(names) ? cJSON_GetArraySize(names) : 0;  // a scalar has no elements
-    for (int i = 0; i < count; ++i) {
-        if (i > 0) joined += ',';
-        joined += zrjsonlh::getString(zrjsonlh::getArrayItem(names, static_cast<std::uint32_t>(i)));
-    }
-    return joined;
+    for (int i = 0; i < count; ++i)
+        list.push_back(zrjsonlh::getString(zrjsonlh::getArrayItem(names, static_cast<std::uint32_t>(i))));
+    return list;
 }
 
 void HorloSession::getTimeReferenceNames(std::string& valueString) {
     const Lock hold(_lock);
-    valueString = timeReferenceNames();
+    const std::vector<std::string> names = timeReferenceNames();
+    std::string joined;
+    for (std::size_t i = 0; i < names.size(); ++i) joined += (i == 0 ? "" : ",") + names[i];
+    valueString = joined;
 }
 
 void HorloSession::getTime(ViUInt32* timeSeconds, ViUInt32* timeNanoseconds, ViUInt16* timeFractionalNanoseconds) {

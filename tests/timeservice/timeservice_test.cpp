@@ -326,7 +326,7 @@ TEST_F(TimeService, ReportsTheSelectedTimeReferenceAndItsOffset) {
     EXPECT_EQ(booleanOf(vi, "BC1", TIKTAL_ATTR_TIME_REFERENCE_SELECTED, VI_TRUE), ok(VI_FALSE));
     // A name must be one of the listed names, not merely part of the list. The type request comes
     // first; the simulator refuses it for a name it does not know, so it is answered here.
-    for (const char* unlisted : {"PTP", "TP1", "GPS9"}) {
+    for (const char* unlisted : {"PTP", "TP1", "GPS9", "PTP1,BC1"}) {
         answerWith(R"({"data":{"type":"IEEE 1588-2008"}})");
         EXPECT_EQ(booleanOf(vi, unlisted, TIKTAL_ATTR_TIME_REFERENCE_SELECTED),
                   Read<ViBoolean>({tiktalerr_trInstanceNotFound, kUnsetBoolean})) << unlisted;
