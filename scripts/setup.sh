@@ -5,7 +5,7 @@ set -euo pipefail
 packages=(
   cmake ninja-build g++ clang pkg-config python3 binutils
   libgtest-dev libgmock-dev libbenchmark-dev
-  libcjson-dev libcurl4-openssl-dev libboost-dev libcpp-httplib-dev
+  libcjson-dev libcurl4-openssl-dev libboost-dev libcpp-httplib-dev libcli11-dev
 )
 
 missing=()

@@ -3,7 +3,8 @@
 
 operations.tsv feeds the session base class, the call-tracing session and (with exports.tsv)
 the exported functions, the version script and the Windows module definition; statuses.tsv
-feeds the message table; attributes.tsv the time-service attribute dictionary."""
+feeds the message table; attributes.tsv the time-service attribute dictionary; both attribute
+tables the list of attributes that the tiktal command knows by name."""
 import argparse
 import os
 import re
@@ -228,6 +229,18 @@ const std::unordered_map<ViAttr, ApiAttrData> kHorloApiAttrDict = {{
 """
 
 
+def gen_command_attributes(tables):
+    """Every attribute by constant name, with its value type and whether it names a time reference."""
+    service = [(c, t, a == "required") for _, c, t, a, *_ in read_tsv(os.path.join(tables, "attributes.tsv"))]
+    module = [(c, t, False) for _, c, t, _ in read_tsv(os.path.join(tables, "module_attributes.tsv"))]
+    rows = "\n".join(f'    {{"{c}", {c}, AttributeType::{t}, {"true" if item else "false"}}},' for c, t, item in service + module)
+    return f"""// Generated from src/tables/attributes.tsv and src/tables/module_attributes.tsv.
+const AttributeInfo kAttributes[] = {{
+{rows}
+}};
+"""
+
+
 def main():
     parser = argparse.ArgumentParser(description=__doc__)
     parser.add_argument("--tables", required=True)
@@ -241,6 +254,7 @@ def main():
     files["apiFunctions.cpp"], files["exports.map"], files["tiktal.def"], files["exports.txt"] = gen_exports(exports)
     files["statusTable.inc"] = gen_status_table(statuses)
     files["HorloApiAttrDict.inc"] = gen_attribute_dictionary(args.tables)
+    files["commandAttributes.inc"] = gen_command_attributes(args.tables)
     for name, text in files.items():
         path = os.path.join(args.out, name)
         old = open(path, encoding="utf-8").read() if os.path.exists(path) else None
