@@ -69,6 +69,17 @@ void unloadLibrary(void* library) noexcept {
     if (library) dlclose(library);
 }
 
+void* findDefinitionBeyond(const char* name) noexcept {
+    if (void* next = dlsym(RTLD_NEXT, name)) return next;
+    void* first = dlsym(RTLD_DEFAULT, name);
+    Dl_info own{}, found{};
+    // The first definition may be the driver library's own: that is no definition beyond it.
+    if (!first || !dladdr(reinterpret_cast<void*>(&findDefinitionBeyond), &own) || !dladdr(first, &found) ||
+        own.dli_fbase == found.dli_fbase)
+        return nullptr;
+    return first;
+}
+
 std::string libraryFileName(const std::string& stem) { return "lib" + stem + ".so"; }
 
 std::string sharedDirectory() {

@@ -43,6 +43,9 @@ void writeDebugOutput(const char* line, std::size_t length) noexcept;
 void* loadLibrary(const std::string& path, std::string& error);
 void* findSymbol(void* library, const char* name, std::string& error);
 void unloadLibrary(void* library) noexcept;
+// The definition of the function `name` in another object than the driver library itself: the
+// first after it in the lookup order, else the first before it. Null when there is none.
+void* findDefinitionBeyond(const char* name) noexcept;
 // The file name of the library `stem` on this system ("libstem.so").
 std::string libraryFileName(const std::string& stem);
 

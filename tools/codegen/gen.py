@@ -168,7 +168,38 @@ def export_body(e):
     return "return VI_SUCCESS;"
 
 
-def gen_exports(exports):
+def read_cjson_functions(header):
+    """(return type, name, parameters) of every function that cJSON's header declares."""
+    if not header:
+        return []
+    pattern = re.compile(r"^CJSON_PUBLIC\((.+?)\)\s*(cJSON_\w+)\((.*?)\);", re.M)
+    with open(header, encoding="utf-8") as f:
+        return pattern.findall(f.read())
+
+
+def gen_cjson_forwarders(functions):
+    """The cJSON functions, exported from the library under their own names: each forwards to
+    cJSON's own definition in the cJSON library the driver library is linked with."""
+    bodies = []
+    for ret, name, params in functions:
+        names = [] if params.strip() == "void" else [re.findall(r"\w+", p)[-1] for p in params.split(",")]
+        call = f"reinterpret_cast<{ret} (*)({params})>(entry)({', '.join(names)})"
+        bodies.append(f"CJSON_PUBLIC({ret}) {name}({params}) {{\n"
+                      f"    static void* const entry = tiktal::cjsonEntry(\"{name}\");\n"
+                      f"    return {call};\n}}\n")
+    return f"""// Generated from cJSON's header.
+#include <cjson/cJSON.h>
+
+#include "api/cjson_exports.h"
+
+extern "C" {{
+
+{chr(10).join(bodies)}
+}}  // extern "C"
+"""
+
+
+def gen_exports(exports, extra_names=()):
     defs = []
     for e in exports:
         if e["kind"] == "manual":
@@ -186,7 +217,7 @@ extern "C" {{
 {chr(10).join(defs)}
 }}  // extern "C"
 """
-    names = [e["name"] for e in exports]
+    names = [e["name"] for e in exports] + list(extra_names)
     version_script = "{\n  global:\n" + "".join(f"    {n};\n" for n in names) + "  local: *;\n};\n"
     numbered = [e for e in exports if e["ordinal"] != "-"]
     module_def = "LIBRARY tiktal\nEXPORTS\n" + "".join(f"    {e['name']} @{e['ordinal']}\n" for e in numbered) + \
@@ -245,13 +276,17 @@ def main():
     parser = argparse.ArgumentParser(description=__doc__)
     parser.add_argument("--tables", required=True)
     parser.add_argument("--out", required=True)
+    parser.add_argument("--cjson-header", help="cJSON's header, whose functions the library exports too")
     args = parser.parse_args()
     ops, exports, statuses = load(args.tables)
     os.makedirs(args.out, exist_ok=True)
     files = {}
     files["SessionClass.h"], files["SessionClass.cpp"] = gen_session_class(ops)
     files["SessionDebugPrintOnly.h"], files["SessionDebugPrintOnly.cpp"] = gen_trace_session(ops)
-    files["apiFunctions.cpp"], files["exports.map"], files["tiktal.def"], files["exports.txt"] = gen_exports(exports)
+    cjson = read_cjson_functions(args.cjson_header)
+    files["apiFunctions.cpp"], files["exports.map"], files["tiktal.def"], files["exports.txt"] = gen_exports(
+        exports, [name for _, name, _ in cjson])
+    files["cjsonForwarders.cpp"] = gen_cjson_forwarders(cjson)
     files["statusTable.inc"] = gen_status_table(statuses)
     files["HorloApiAttrDict.inc"] = gen_attribute_dictionary(args.tables)
     files["commandAttributes.inc"] = gen_command_attributes(args.tables)
