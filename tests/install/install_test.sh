@@ -1,0 +1,69 @@
+#!/usr/bin/env bash
+# Installs the build into a temporary prefix, builds the examples against it with pkg-config and
+# with the CMake package, and runs them against the installed time-service simulator.
+# Usage: install_test.sh BUILD_DIR SOURCE_DIR
+set -euo pipefail
+build=$1
+source=$2
+work=$(mktemp -d)
+sim_pid=
+cleanup() {
+  [ -z "$sim_pid" ] || { kill "$sim_pid" 2>/dev/null; wait "$sim_pid" 2>/dev/null; } || true
+  rm -rf "$work"
+}
+trap cleanup EXIT
+fail() { echo "FAIL: $*" >&2; exit 1; }
+expect() {  # expect FILE TEXT: the output holds the text
+  grep -qF -- "$2" "$1" || { cat "$1" >&2; fail "$1 lacks: $2"; }
+}
+
+prefix=$work/prefix
+cmake --install "$build" --prefix "$prefix" >/dev/null
+libdir=$(dirname "$(find "$prefix" -name 'libtiktal.so' | head -n 1)")
+[ -f "$libdir/pkgconfig/tiktal.pc" ] || fail "no pkg-config file"
+[ -f "$libdir/cmake/tiktal/tiktalConfig.cmake" ] || fail "no CMake package"
+for runtime in zrssl/libzrsslinit.so zrcurl/libcurlimpl.so; do
+  [ -f "$libdir/tiktal/$runtime" ] || fail "run-time library $runtime not installed"
+done
+
+# pkg-config
+export PKG_CONFIG_PATH=$libdir/pkgconfig
+mkdir "$work/pc"
+for program in time_references size_query; do
+  cc -std=c99 -Wall -Werror "$source/examples/$program.c" $(pkg-config --cflags --libs tiktal) \
+    -Wl,-rpath,"$libdir" -o "$work/pc/$program"
+done
+cc "$source/tests/install/app/cjson_through_tiktal.c" $(pkg-config --cflags --libs tiktal) \
+  -Wl,-rpath,"$libdir" -o "$work/pc/cjson_through_tiktal"
+
+# CMake package
+cmake -S "$source/tests/install/app" -B "$work/cmake" -DCMAKE_PREFIX_PATH="$prefix" \
+  -DCMAKE_BUILD_RPATH="$libdir" >/dev/null
+cmake --build "$work/cmake" >/dev/null
+
+# The installed simulator, and the examples of both builds against it.
+"$prefix/bin/timeservice_sim" --listen 127.0.0.2:0 --state "$work/state.json" >"$work/sim.out" 2>&1 &
+sim_pid=$!
+for _ in $(seq 100); do
+  grep -q '^listening on' "$work/sim.out" && break
+  sleep 0.1
+done
+address=$(sed -n 's/^listening on //p' "$work/sim.out")
+[ -n "$address" ] || fail "the simulator did not start"
+export ZRSHAREDDIR=$libdir/tiktal
+
+for dir in "$work/pc" "$work/cmake"; do
+  "$dir/time_references" "sync://$address/system" >"$work/out" 2>&1 || { cat "$work/out"; fail "$dir/time_references"; }
+  expect "$work/out" "time: "
+  expect "$work/out" "PTP1"
+  expect "$work/out" "IEEE 802.1AS-2011 TAB"
+  "$dir/size_query" "sync://$address/sync_1" >"$work/out" 2>&1 || fail "$dir/size_query"
+  expect "$work/out" 'time references: "PTP1,BC1,AS1,TAB1"'
+  expect "$work/out" "size query                                   status 18 "
+  expect "$work/out" "0xBFFF000E): The given session or object reference is invalid."
+  "$dir/cjson_through_tiktal" >"$work/out" || fail "$dir/cjson_through_tiktal"
+  expect "$work/out" '{"references":["PTP1","AS1"],"count":2}'
+done
+"$work/pc/time_references" "sync://localhost/system" >"$work/out" 2>&1 && fail "localhost was accepted"
+expect "$work/out" "tiktal_init failed: 0xBFFA4016 The specified device was not found."
+echo "install test passed"
