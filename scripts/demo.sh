@@ -14,23 +14,11 @@ echo
 build/examples/size_query "SyncTestInternal___" 2>&1
 echo
 
+. scripts/simulator.sh
 workdir=$(mktemp -d)
-sim_pid=
-cleanup() {
-  [ -z "$sim_pid" ] || kill "$sim_pid" 2>/dev/null || true
-  [ -z "$sim_pid" ] || wait "$sim_pid" 2>/dev/null || true
-  rm -rf "$workdir"
-}
-trap cleanup EXIT
-
-build/sim/timeservice/timeservice_sim --listen 127.0.0.2:0 --state "$workdir/state.json" >"$workdir/sim.out" 2>&1 &
-sim_pid=$!
-for _ in $(seq 100); do
-  grep -q '^listening on' "$workdir/sim.out" && break
-  sleep 0.1
-done
-address=$(sed -n 's/^listening on //p' "$workdir/sim.out")
-[ -n "$address" ] || { cat "$workdir/sim.out"; echo "the time-service simulator did not start" >&2; exit 1; }
+trap 'stop_simulator; rm -rf "$workdir"' EXIT
+start_simulator build/sim/timeservice/timeservice_sim "$workdir/state.json"
+address=$sim_address
 
 echo "== a time service: the simulator listens on $address"
 echo

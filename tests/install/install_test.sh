@@ -6,12 +6,8 @@ set -euo pipefail
 build=$1
 source=$2
 work=$(mktemp -d)
-sim_pid=
-cleanup() {
-  [ -z "$sim_pid" ] || { kill "$sim_pid" 2>/dev/null; wait "$sim_pid" 2>/dev/null; } || true
-  rm -rf "$work"
-}
-trap cleanup EXIT
+. "$source/scripts/simulator.sh"
+trap 'stop_simulator; rm -rf "$work"' EXIT
 fail() { echo "FAIL: $*" >&2; exit 1; }
 expect() {  # expect FILE TEXT: the output holds the text
   grep -qF -- "$2" "$1" || { cat "$1" >&2; fail "$1 lacks: $2"; }
@@ -42,14 +38,8 @@ cmake -S "$source/tests/install/app" -B "$work/cmake" -DCMAKE_PREFIX_PATH="$pref
 cmake --build "$work/cmake" >/dev/null
 
 # The installed simulator, and the examples of both builds against it.
-"$prefix/bin/timeservice_sim" --listen 127.0.0.2:0 --state "$work/state.json" >"$work/sim.out" 2>&1 &
-sim_pid=$!
-for _ in $(seq 100); do
-  grep -q '^listening on' "$work/sim.out" && break
-  sleep 0.1
-done
-address=$(sed -n 's/^listening on //p' "$work/sim.out")
-[ -n "$address" ] || fail "the simulator did not start"
+start_simulator "$prefix/bin/timeservice_sim" "$work/state.json"
+address=$sim_address
 export ZRSHAREDDIR=$libdir/tiktal
 
 for dir in "$work/pc" "$work/cmake"; do
