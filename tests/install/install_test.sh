@@ -54,6 +54,8 @@ for dir in "$work/pc" "$work/cmake"; do
   "$dir/cjson_through_tiktal" >"$work/out" || fail "$dir/cjson_through_tiktal"
   expect "$work/out" '{"references":["PTP1","AS1"],"count":2}'
 done
+"$prefix/bin/tiktal" refs "sync://$address/system" >"$work/out" 2>&1 || { cat "$work/out"; fail "tiktal refs"; }
+expect "$work/out" "TAB1  IEEE 802.1AS-2011 TAB"
 "$work/pc/time_references" "sync://localhost/system" >"$work/out" 2>&1 && fail "localhost was accepted"
 expect "$work/out" "tiktal_init failed: 0xBFFA4016 The specified device was not found."
 echo "install test passed"
