@@ -7,6 +7,7 @@
 #include <functional>
 #include <iostream>
 #include <string>
+#include <tuple>
 #include <utility>
 #include <vector>
 
@@ -86,17 +87,17 @@ int main(int argc, char** argv) {
     addItemAndType(set, options);
     commands.emplace_back(set, cli::setCommand);
 
-    CLI::App* refs = addCommand(app, options, "refs", "List the time references with their state");
-    addResource(refs, options);
-    commands.emplace_back(refs, cli::refsCommand);
-
-    CLI::App* time = addCommand(app, options, "time", "Read the current time (seconds since the Unix epoch)");
-    addResource(time, options);
-    commands.emplace_back(time, cli::timeCommand);
-
-    CLI::App* persist = addCommand(app, options, "persist", "Make the device store its configuration");
-    addResource(persist, options);
-    commands.emplace_back(persist, cli::persistCommand);
+    // The subcommands that take nothing but the resource.
+    const std::tuple<const char*, const char*, void (*)(const Options&)> resourceOnly[] = {
+        {"refs", "List the time references with their state", cli::refsCommand},
+        {"time", "Read the current time (seconds since the Unix epoch)", cli::timeCommand},
+        {"persist", "Make the device store its configuration", cli::persistCommand},
+    };
+    for (const auto& [name, description, run] : resourceOnly) {
+        CLI::App* command = addCommand(app, options, name, description);
+        addResource(command, options);
+        commands.emplace_back(command, run);
+    }
 
     CLI::App* status = addCommand(app, options, "status", "Explain a status code");
     status->add_option("CODE", options.code, "Status in hex (0xBFFA4003) or decimal, signed or unsigned")->required();
