@@ -24,8 +24,11 @@ void requireOutput(const void* value) {
     if (!value) throw ZRERR_RAISE(tiktalerr_invParameter).debug("message", kMissingParameter).debug("value", "NULL");
 }
 
-[[noreturn]] void missingMember(const std::string& json, const std::string& key, const char* message = kParseFailure) {
-    throw ZRERR_RAISE(tiktalerr_internalSoftware).debug("message", message).debug("json", json).debug("key", key);
+[[noreturn]] void missingMember(const std::string& json, const std::string& key, const char* message = nullptr) {
+    throw ZRERR_RAISE(tiktalerr_internalSoftware)
+        .debug("message", message ? message : kParseFailure)
+        .debug("json", json)
+        .debug("key", key);
 }
 
 bool isPtpAccuracy(ViAttr a) { return a == TIKTAL_ATTR_1588_CLOCK_ACCURACY || a == TIKTAL_ATTR_1588_GM_CLOCK_ACCURACY; }
@@ -71,11 +74,7 @@ std::string HorloSession::getTrAttr(ViConstString terminalName, const std::strin
 }
 
 std::string HorloSession::getTrType(ViConstString trName) {
-    const std::string json = getTrAttr(trName, "type");
-    std::string type;
-    if (!zrjson::getStringMember(json, "type", type))
-        missingMember(json, "type", "Failed to parse time reference type from Horlo metadata.");
-    return type;
+    return readTrAttrText(trName, "type", "Failed to parse time reference type from Horlo metadata.");
 }
 
 std::string HorloSession::getSelectedTrId() {
@@ -95,10 +94,10 @@ std::string HorloSession::getSelectedTrType() {
     return selected.empty() ? std::string() : getTrType(selected.c_str());
 }
 
-std::string HorloSession::readTrAttrText(ViConstString terminalName, const std::string& key) {
+std::string HorloSession::readTrAttrText(ViConstString terminalName, const std::string& key, const char* missing) {
     const std::string json = getTrAttr(terminalName, key);
     std::string text;
-    if (!zrjson::getStringMember(json, key.c_str(), text)) missingMember(json, key);
+    if (!zrjson::getStringMember(json, key.c_str(), text)) missingMember(json, key, missing);
     return text;
 }
 
@@ -158,10 +157,7 @@ void HorloSession::getAttributeViReal64(ViConstString terminalName, ViAttr attri
     } else if (attribute == TIKTAL_ATTR_SELECTED_TIME_REFERENCE_OFFSET_NS) {
         *value = static_cast<double>(getSelectedTrOffsetNanos());
     } else {
-        const std::string json = getTrAttr(terminalName, key);
-        std::string text;
-        if (!zrjson::getStringMember(json, key.c_str(), text)) missingMember(json, key);
-        *value = boost::lexical_cast<double>(text);
+        *value = boost::lexical_cast<double>(readTrAttrText(terminalName, key));  // the service sends a text
     }
 }
 

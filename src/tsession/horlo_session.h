@@ -45,7 +45,8 @@ private:
     std::string getSelectedTrId();  // empty when none is selected
     std::int64_t getSelectedTrOffsetNanos();  // 0 when none is selected
     std::string getTrAttr(ViConstString terminalName, const std::string& key);
-    std::string readTrAttrText(ViConstString terminalName, const std::string& key);
+    // The text member `key`; a missing one fails with `missing` as its message (null: the usual).
+    std::string readTrAttrText(ViConstString terminalName, const std::string& key, const char* missing = nullptr);
     void writeTrAttr(ViConstString terminalName, const std::string& key, const std::string& valueText);
     std::vector<std::string> timeReferenceNames();
 
