@@ -2,8 +2,8 @@
 
 #include <memory>
 
+#include "client/answer.h"
 #include "client/curl_library.h"
-#include "client/envelope.h"
 #include "errors/zrerr.h"
 
 namespace zr::vantle::shared {
@@ -13,9 +13,12 @@ namespace lib = curllib;
 
 #define TCURL_RAISE(constant) ::zrerr::raise((constant), #constant, ZRERR_FILE, __LINE__, "zrgvshared_debug")
 
+// Appends to the answer; an answer that grows beyond kMaxAnswerBytes aborts the transfer.
 size_t writeCallback(char* data, size_t size, size_t count, void* user) {
     if (!user) return 0;
-    static_cast<std::string*>(user)->append(data, size * count);
+    std::string& answer = *static_cast<std::string*>(user);
+    if (size * count > kMaxAnswerBytes - answer.size()) return 0;
+    answer.append(data, size * count);
     return size * count;
 }
 
@@ -52,51 +55,6 @@ public:
 private:
     CURL* _handle;
 };
-
-void classify(long responseCode) {
-    const auto fail = [responseCode](zrerr::Exception e) { return e.debug("responseCode", responseCode); };
-    switch (responseCode) {
-    case 202: throw fail(TCURL_RAISE(kNetworkClientInProgress));
-    case 400: throw fail(TCURL_RAISE(kNetworkClientBadRequestError));
-    case 401: throw fail(TCURL_RAISE(kNetworkClientUnauthorizedError));
-    case 404: throw fail(TCURL_RAISE(kNetworkClientNotFoundError));
-    case 408: throw fail(TCURL_RAISE(kNetworkClientRequestTimeoutError));
-    case 415: throw fail(TCURL_RAISE(kNetworkClientUnsupportedMediaType));
-    }
-    if (responseCode >= 400 && responseCode <= 498) throw fail(TCURL_RAISE(kNetworkClientError));
-    if (responseCode >= 500 && responseCode <= 598) throw fail(TCURL_RAISE(kNetworkServerError));
-}
-
-// The answer's "result" text (or the whole body); a failure when its "error" says so.
-std::string unwrap(const std::string& body) {
-    const envelope::ScanError scan = envelope::check(body);
-    if (scan != envelope::kOk) throw TCURL_RAISE(kInvalidJSONResponseFromServer).debug("jsonz_ErrorCode", static_cast<int>(scan));
-
-    bool success = true;
-    std::int32_t errorCode = 0;
-    std::string_view errorText, errorInfo;
-    if (const auto error = envelope::findMember(body, "error")) {
-        const std::string_view errorValue = envelope::valueText(body, *error).value_or("");
-        const auto member = [&](const char* name) { return envelope::findMember(errorValue, name); };
-        const auto successAt = member("success");
-        success = successAt && envelope::readBool(errorValue, *successAt);
-        if (const auto at = member("errorCode")) errorCode = envelope::readNumber(errorValue, *at);
-        if (const auto at = member("errorText")) errorText = envelope::readString(errorValue, *at);
-        if (const auto at = member("errorInfo")) errorInfo = envelope::readString(errorValue, *at);
-    }
-    if (!success) {
-        // A failure without a code of its own must not read as success: report it as the
-        // server's error.
-        const std::int32_t status = errorCode != 0 ? errorCode : kNetworkServerError;
-        throw zrerr::raise(status, errorCode != 0 ? "errorCode" : "kNetworkServerError", ZRERR_FILE, __LINE__,
-                           "zrgvshared_debug")
-            .debug("errorText", std::string(errorText).c_str())
-            .debug("errorInfo", std::string(errorInfo).c_str());
-    }
-    if (const auto result = envelope::findMember(body, "result"))
-        if (const auto text = envelope::valueText(body, *result)) return std::string(*text);
-    return body;
-}
 
 }  // namespace
 
@@ -142,19 +100,24 @@ void tCURL::setOptions(bool upload, const std::string& url, HeaderList& headers,
                  "curl_easy_setopt(_connection, CURLOPT_TIMEOUT_MS, static_cast<long>(_timeoutInMS))");
     TCURL_SETOPT(CURLOPT_NOSIGNAL, 1L, "curl_easy_setopt(_connection, CURLOPT_NOSIGNAL, 1L)");
     TCURL_SETOPT(CURLOPT_URL, url.c_str(), "curl_easy_setopt(_connection, CURLOPT_URL, url.c_str())");
+    // An answer that announces more than the transport takes is refused before its body is read.
+    TCURL_SETOPT(CURLOPT_MAXFILESIZE_LARGE, static_cast<curl_off_t>(kMaxAnswerBytes),
+                 "curl_easy_setopt(_connection, CURLOPT_MAXFILESIZE_LARGE, kMaxAnswerBytes)");
     if (!_username.empty())
         TCURL_SETOPT(CURLOPT_USERNAME, _username.c_str(), "curl_easy_setopt(_connection, CURLOPT_USERNAME, _username.c_str())");
     if (!_password.empty())
         TCURL_SETOPT(CURLOPT_PASSWORD, _password.c_str(), "curl_easy_setopt(_connection, CURLOPT_PASSWORD, _password.c_str())");
-    const auto addHeader = [&headers](const std::string& name, const std::string& value) {
-        if (value.empty()) return;
-        curl_slist* list = lib::slistAppend(headers.get(), (name + value).c_str());
+    const auto addHeader = [&headers](const std::string& line) {
+        curl_slist* list = lib::slistAppend(headers.get(), line.c_str());
         if (!list) throw std::bad_alloc();
         (void)headers.release();  // the same list, or a new one when it was empty
         headers.reset(list);
     };
-    addHeader("Accept: ", _acceptType);
-    addHeader("Content-Type: ", _contentType);
+    if (!_acceptType.empty()) addHeader("Accept: " + _acceptType);
+    if (!_contentType.empty()) addHeader("Content-Type: " + _contentType);
+    // An upload goes out at once: many services never answer "Expect: 100-continue", and libcurl
+    // would wait a second for it. A header without a value removes libcurl's own.
+    if (upload) addHeader("Expect:");
     if (headers)
         TCURL_SETOPT(CURLOPT_HTTPHEADER, headers.get(), "curl_easy_setopt(_connection, CURLOPT_HTTPHEADER, headerList.get())");
     TCURL_SETOPT(CURLOPT_ERRORBUFFER, errorBuffer, "curl_easy_setopt(_connection, CURLOPT_ERRORBUFFER, errbuf)");
@@ -172,11 +135,15 @@ std::string tCURL::request(bool upload, const std::string& path, std::string& up
     setOptions(upload, _uri + "/" + _prefix + "/" + path, headers, errorBuffer, uploadBuffer);
 
     const CURLcode performed = lib::easyPerform(handle);
-    if (performed != CURLE_OK)
-        throw TCURL_RAISE(kInternalSoftwareErrorUnknownNetworkError)
-            .debug("function", "curl_easy_perform")
-            .debug("CURLcode", static_cast<int>(performed))
-            .debug("CURLOPT_ERRORBUFFER", errorBuffer);
+    if (performed != CURLE_OK) {
+        zrerr::Exception failure = TCURL_RAISE(kInternalSoftwareErrorUnknownNetworkError)
+                                       .debug("function", "curl_easy_perform")
+                                       .debug("CURLcode", static_cast<int>(performed))
+                                       .debug("CURLOPT_ERRORBUFFER", errorBuffer);
+        if (performed == CURLE_WRITE_ERROR || performed == CURLE_FILESIZE_EXCEEDED)
+            failure.debug("maxAnswerBytes", kMaxAnswerBytes);
+        throw failure;
+    }
     long responseCode = 0;
     if (lib::easyGetinfo(handle, CURLINFO_RESPONSE_CODE, &responseCode) != CURLE_OK)
         throw TCURL_RAISE(kInternalSoftwareError)

@@ -2,7 +2,6 @@
 
 #include <charconv>
 #include <cmath>
-#include <limits>
 #include <string>
 
 namespace zr::vantle::shared::envelope {
@@ -59,6 +58,8 @@ public:
     }
 
     ScanError object() {
+        const Nesting nesting(_depth);
+        if (_depth > kMaxDepth) return kTooDeep;
         ++_at;  // "{"
         skipSpace();
         if (peek() == '}') {
@@ -77,6 +78,8 @@ public:
     }
 
     ScanError array() {
+        const Nesting nesting(_depth);
+        if (_depth > kMaxDepth) return kTooDeep;
         ++_at;  // "["
         skipSpace();
         if (peek() == ']') {
@@ -91,6 +94,13 @@ public:
 
 private:
     static constexpr ScanError kClosed = static_cast<ScanError>(-1);
+
+    // Counts one level of nesting while an object or array is walked.
+    struct Nesting {
+        explicit Nesting(int& depth) : _depth(++depth) {}
+        ~Nesting() { --_depth; }
+        int& _depth;
+    };
 
     // After an element: "," and another element, or the closing bracket.
     ScanError separator(char closing, ScanError notClosed) {
@@ -169,6 +179,7 @@ private:
 
     std::string_view _text;
     std::size_t _at;
+    int _depth = 0;
 };
 
 }  // namespace
@@ -205,17 +216,16 @@ std::optional<std::size_t> findMember(std::string_view text, std::string_view na
 
 bool readBool(std::string_view text, std::size_t at) { return text.substr(at, 4) == "true"; }
 
-std::int32_t readNumber(std::string_view text, std::size_t at) {
+std::optional<double> readWholeNumber(std::string_view text, std::size_t at) {
     Scanner scanner(text, at);
-    if (scanner.value() != kOk) return 0;
+    if (scanner.value() != kOk) return std::nullopt;
     const std::string_view number = text.substr(at, scanner.position() - at);
-    if (number.empty() || (number[0] != '-' && !isDigit(number[0]))) return 0;
+    if (number.empty() || (number[0] != '-' && !isDigit(number[0]))) return std::nullopt;
     double value = 0;
     const auto [end, error] = std::from_chars(number.data(), number.data() + number.size(), value);
-    if (error != std::errc() || end != number.data() + number.size()) return 0;
-    constexpr double kMin = std::numeric_limits<std::int32_t>::min();
-    constexpr double kMax = std::numeric_limits<std::int32_t>::max();
-    return static_cast<std::int32_t>(std::trunc(value < kMin ? kMin : value > kMax ? kMax : value));
+    if (error != std::errc() || end != number.data() + number.size()) return std::nullopt;
+    if (!std::isfinite(value) || value != std::trunc(value)) return std::nullopt;
+    return value;
 }
 
 std::string_view readString(std::string_view text, std::size_t at) {

@@ -21,7 +21,12 @@ enum ScanError : int {
     kInvalidEscape = 7,
     kTrailingComma = 8,       // "," directly before "}" or "]"
     kTrailingCharacters = 9,  // characters after the value
+    kTooDeep = 10,            // objects and arrays nested deeper than kMaxDepth
 };
+
+// The deepest nesting of objects and arrays the scanner walks; the service's answers need a few
+// levels, and a bound keeps a hostile answer from exhausting the caller's stack.
+inline constexpr int kMaxDepth = 128;
 
 ScanError check(std::string_view text);
 
@@ -31,8 +36,9 @@ std::optional<std::size_t> findMember(std::string_view text, std::string_view na
 
 // Readers of the value at `at`.
 bool readBool(std::string_view text, std::size_t at);
-// Integers convert directly, fractions and exponents truncate toward zero; 0 for anything else.
-std::int32_t readNumber(std::string_view text, std::size_t at);
+// A number whose value is whole, however it is written ("-5", "-5.0", "-5e0"); nothing for
+// anything else, a fraction, or a value beyond the range of a double.
+std::optional<double> readWholeNumber(std::string_view text, std::size_t at);
 // The undecoded characters between the quotes; empty for anything else.
 std::string_view readString(std::string_view text, std::size_t at);
 // The text of the value at `at` exactly as written: an object or array to its matching bracket,

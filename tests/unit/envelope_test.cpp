@@ -35,6 +35,21 @@ TEST(Envelope, WholeTextCheckGivesEachErrorCode) {
         {"{} {}", env::kTrailingCharacters},
     };
     for (const auto& [text, code] : bad) EXPECT_EQ(env::check(text), code) << text;
+
+    // Nesting is walked to kMaxDepth levels; deeper fails without exhausting the stack.
+    const auto nested = [](std::size_t depth, const char* open, const char* close) {
+        std::string text;
+        for (std::size_t i = 0; i < depth; ++i) text += open;
+        text += "1";
+        for (std::size_t i = 0; i < depth; ++i) text += close;
+        return text;
+    };
+    EXPECT_EQ(env::check(nested(env::kMaxDepth, "[", "]")), env::kOk);
+    EXPECT_EQ(env::check(nested(env::kMaxDepth, "{\"a\":", "}")), env::kOk);
+    EXPECT_EQ(env::check(nested(env::kMaxDepth + 1, "[", "]")), env::kTooDeep);
+    EXPECT_EQ(env::check(std::string(1000000, '[')), env::kTooDeep);
+    EXPECT_EQ(env::check("[" + nested(env::kMaxDepth, "{\"a\":", "}") + "]"), env::kTooDeep);
+    EXPECT_FALSE(env::valueText(std::string(1000000, '['), 0).has_value());
 }
 
 TEST(Envelope, FindsMembersByDecodedNameAndReadsValues) {
@@ -44,18 +59,24 @@ TEST(Envelope, FindsMembersByDecodedNameAndReadsValues) {
     ASSERT_TRUE(error.has_value());
     const std::string errorText(*env::valueText(text, *error));
     EXPECT_TRUE(env::readBool(errorText, *env::findMember(errorText, "success")));
-    EXPECT_EQ(env::readNumber(errorText, *env::findMember(errorText, "errorCode")), -123);
+    EXPECT_FALSE(env::readWholeNumber(errorText, *env::findMember(errorText, "errorCode")).has_value());
     EXPECT_EQ(env::readString(errorText, *env::findMember(errorText, "errorText")), R"(a \"quoted\" text)");
     EXPECT_EQ(*env::valueText(text, *env::findMember(text, "result")), R"({"data" : { "k" : [ 1, 2 ] } })");
     EXPECT_FALSE(env::findMember(text, "Result").has_value());  // exact names
     EXPECT_FALSE(env::findMember("[1]", "result").has_value());
     EXPECT_FALSE(env::findMember(R"({"a":1 "result":2})", "result").has_value());  // malformed before it
 
-    const std::string scalars = R"({"t":true,"n":"7","big":1e12,"i":42,"s":5})";
+    const std::string scalars =
+        R"({"t":true,"n":"7","big":1e12,"i":42,"s":5,"w":-5.0e0,"huge":1e400,"digits":)" + std::string(400, '9') + "}";
+    const auto whole = [&](const char* name) { return env::readWholeNumber(scalars, *env::findMember(scalars, name)); };
     EXPECT_FALSE(env::readBool(scalars, *env::findMember(scalars, "n")));
-    EXPECT_EQ(env::readNumber(scalars, *env::findMember(scalars, "n")), 0);
-    EXPECT_EQ(env::readNumber(scalars, *env::findMember(scalars, "i")), 42);
-    EXPECT_EQ(env::readNumber(scalars, *env::findMember(scalars, "big")), 2147483647);
+    EXPECT_FALSE(whole("n").has_value());
+    EXPECT_EQ(whole("i"), 42.0);
+    EXPECT_EQ(whole("big"), 1e12);
+    EXPECT_EQ(whole("w"), -5.0);
+    EXPECT_FALSE(whole("huge").has_value());  // beyond a double
+    EXPECT_FALSE(whole("digits").has_value());
+    EXPECT_FALSE(whole("t").has_value());
     EXPECT_EQ(env::readString(scalars, *env::findMember(scalars, "s")), "");
 }
 
