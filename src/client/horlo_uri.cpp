@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "errors/zrerr.h"
+#include "support/casefold.h"
 
 namespace horloUtils {
 namespace {
@@ -10,6 +11,15 @@ namespace {
 constexpr char kSchemeSeparator[] = "://";
 constexpr char kPathSeparator[] = "/";
 constexpr char kScheme[] = "sync";
+
+// A host names a machine and, optionally, a port. Characters that would give it user information
+// (credentials), a query, a fragment or a path in a URL have no place in it, nor have white space,
+// control characters or malformed UTF-8.
+bool isPlainHost(const std::string& host) {
+    for (const unsigned char c : host)
+        if (c <= 0x20 || c == 0x7F || c == '@' || c == '?' || c == '#' || c == '/' || c == '\\') return false;
+    return support::isValidUtf8(host);
+}
 
 }  // namespace
 
@@ -28,7 +38,7 @@ HorloUri::HorloUri(const std::string& resourceName) {
     std::string scheme = _scheme;
     // Lower case of the classic locale, whatever locale the application has set.
     std::transform(scheme.begin(), scheme.end(), scheme.begin(), [](char c) { return c >= 'A' && c <= 'Z' ? c + 32 : c; });
-    if (scheme != kScheme || _host.empty() || _deviceName.empty())
+    if (scheme != kScheme || _host.empty() || _deviceName.empty() || !isPlainHost(_host))
         throw ZRERR_RAISE(tiktalerr_invalidResourceNameFormat).debug("func", "horloUtils::HorloUri::HorloUri");
 }
 

@@ -8,7 +8,8 @@ namespace horloUtils {
 class HorloUri {
 public:
     // Fails with tiktalerr_invalidResourceNameFormat unless the scheme is "sync" in any case and
-    // the host and the device name are not empty; the device name holds no further "/".
+    // the host and the device name are not empty; the device name holds no further "/", the host
+    // no "@", "?", "#", "\\", white space, control character or malformed UTF-8.
     explicit HorloUri(const std::string& resourceName);
 
     std::string getHost() const { return _host; }

@@ -1,6 +1,7 @@
 #include "json/helpers.h"
 
 #include <boost/lexical_cast.hpp>
+#include <cmath>
 
 #include "errors/zrerr.h"
 #include "json/zrjsonlh.h"
@@ -11,21 +12,33 @@ namespace {
 // The member, or null when it is absent (also when the text is no object).
 cJSON* findMember(const zrjsonlh::CppJson& json, const char* name) { return cJSON_GetObjectItem(json.get(), name); }
 
-// The member readers: false when absent, true and `out` untouched when null; a value of another
-// type fails with -52004 naming the text and the key.
+zrerr::Exception typeMismatch(const std::string& jsonText, const char* name, const char* message) {
+    return zrerr::raise(zrjsonlh::jsonErrorsTypeMismatch, "errCode", ZRERR_FILE, __LINE__)
+        .debug("message", message)
+        .debug("JSON", jsonText.c_str())
+        .debug("key", name);
+}
+
+// The member readers: false when absent, a null member as `onNull` says; a value of another type
+// fails with -52004 naming the text and the key.
 template <class Value>
 bool readMember(const std::string& jsonText, const char* name, Value& out, cJSON_bool (*hasType)(const cJSON*),
-                Value (*convert)(const cJSON*)) {
+                Value (*convert)(const cJSON*), OnNull onNull) {
     const zrjsonlh::CppJson json(jsonText.c_str());
     const cJSON* member = findMember(json, name);
     if (!member) return false;
-    if (cJSON_IsNull(member)) return true;
+    if (cJSON_IsNull(member) && onNull == OnNull::keepOutput) return true;
     if (!hasType(member))
-        throw zrerr::raise(zrjsonlh::jsonErrorsTypeMismatch, "errCode", ZRERR_FILE, __LINE__)
-            .debug("message", "Error parsing: expected data type does not match the parsed value.")
-            .debug("JSON", jsonText.c_str())
-            .debug("key", name);
+        throw typeMismatch(jsonText, name, "Error parsing: expected data type does not match the parsed value.");
     out = convert(member);
+    return true;
+}
+
+// Whether every number in `item` is finite. cJSON bounds the nesting of what it parses.
+bool allFinite(const cJSON* item) {
+    if (cJSON_IsNumber(item)) return std::isfinite(item->valuedouble);
+    for (const cJSON* child = item->child; child; child = child->next)
+        if (!allFinite(child)) return false;
     return true;
 }
 
@@ -33,16 +46,16 @@ bool toBool(const cJSON* item) { return cJSON_IsTrue(item); }
 
 }  // namespace
 
-bool getStringMember(const std::string& jsonText, const char* name, std::string& out) {
-    return readMember(jsonText, name, out, cJSON_IsString, zrjsonlh::getString);
+bool getStringMember(const std::string& jsonText, const char* name, std::string& out, OnNull onNull) {
+    return readMember(jsonText, name, out, cJSON_IsString, zrjsonlh::getString, onNull);
 }
 
-bool getInt32NumberMember(const std::string& jsonText, const char* name, std::int32_t& out) {
-    return readMember(jsonText, name, out, cJSON_IsNumber, zrjsonlh::getInt32);
+bool getInt32NumberMember(const std::string& jsonText, const char* name, std::int32_t& out, OnNull onNull) {
+    return readMember(jsonText, name, out, cJSON_IsNumber, zrjsonlh::getInt32, onNull);
 }
 
 bool getBoolMember(const std::string& jsonText, const char* name, bool& out) {
-    return readMember(jsonText, name, out, cJSON_IsBool, toBool);
+    return readMember(jsonText, name, out, cJSON_IsBool, toBool, OnNull::keepOutput);
 }
 
 bool getObjectMemberText(const std::string& jsonText, const char* name, std::string& out) {
@@ -50,6 +63,7 @@ bool getObjectMemberText(const std::string& jsonText, const char* name, std::str
     const cJSON* member = findMember(json, name);
     if (!member) return false;
     zrjsonlh::checkObject(member);
+    if (!allFinite(member)) throw typeMismatch(jsonText, name, "A number is beyond the range of a double.");
     out = zrjsonlh::printUnformatted(member);
     return true;
 }

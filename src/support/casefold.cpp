@@ -6,8 +6,10 @@
 namespace support {
 namespace {
 
-// Decodes UTF-8; nothing for malformed input.
+// Decodes UTF-8; nothing for malformed input: a stray or missing continuation byte, an overlong
+// form, a surrogate or a code point above U+10FFFF.
 std::optional<std::vector<char32_t>> decode(std::string_view text) {
+    static constexpr char32_t kSmallest[] = {0, 0x80, 0x800, 0x10000};  // by the number of extra bytes
     std::vector<char32_t> out;
     for (std::size_t i = 0; i < text.size();) {
         const unsigned char lead = static_cast<unsigned char>(text[i]);
@@ -19,6 +21,7 @@ std::optional<std::vector<char32_t>> decode(std::string_view text) {
             if ((next >> 6) != 2) return std::nullopt;
             c = (c << 6) | (next & 0x3F);
         }
+        if (c < kSmallest[extra] || (c >= 0xD800 && c <= 0xDFFF) || c > 0x10FFFF) return std::nullopt;
         out.push_back(c);
         i += static_cast<std::size_t>(extra) + 1;
     }
@@ -61,6 +64,8 @@ std::optional<std::vector<char32_t>> folded(std::string_view text) {
 }
 
 }  // namespace
+
+bool isValidUtf8(std::string_view text) { return decode(text).has_value(); }
 
 bool equalsIgnoringCase(std::string_view a, std::string_view b) {
     if (a == b) return true;

@@ -1,4 +1,4 @@
-// Comparison of UTF-8 texts ignoring case.
+// Checks and comparison of UTF-8 texts.
 #pragma once
 
 #include <string_view>
@@ -9,5 +9,8 @@ namespace support {
 // Roman numeral, circled letter, fullwidth Latin and ligature code points. Malformed UTF-8
 // compares unequal unless the bytes are equal.
 bool equalsIgnoringCase(std::string_view a, std::string_view b);
+
+// Well-formed UTF-8: no overlong forms, surrogates or code points above U+10FFFF.
+bool isValidUtf8(std::string_view text);
 
 }  // namespace support

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <boost/lexical_cast.hpp>
+#include <cmath>
 #include <iterator>
 
 #include "client/horlo_uri.h"
@@ -29,6 +30,12 @@ void requireOutput(const void* value) {
         .debug("message", message ? message : kParseFailure)
         .debug("json", json)
         .debug("key", key);
+}
+
+// A Real64 attribute is a measurement: "inf" or "nan" from the service is no value.
+double finite(double value) {
+    if (!std::isfinite(value)) throw boost::bad_lexical_cast();
+    return value;
 }
 
 bool isPtpAccuracy(ViAttr a) { return a == TIKTAL_ATTR_1588_CLOCK_ACCURACY || a == TIKTAL_ATTR_1588_GM_CLOCK_ACCURACY; }
@@ -97,7 +104,7 @@ std::string HorloSession::getSelectedTrType() {
 std::string HorloSession::readTrAttrText(ViConstString terminalName, const std::string& key, const char* missing) {
     const std::string json = getTrAttr(terminalName, key);
     std::string text;
-    if (!zrjson::getStringMember(json, key.c_str(), text)) missingMember(json, key, missing);
+    if (!zrjson::getStringMember(json, key.c_str(), text, zrjson::OnNull::fail)) missingMember(json, key, missing);
     return text;
 }
 
@@ -134,17 +141,18 @@ void HorloSession::getAttributeViInt32(ViConstString terminalName, ViAttr attrib
         const std::string json = getTrAttr(terminalName, key);
         std::string text;
         try {
-            if (!zrjson::getStringMember(json, key.c_str(), text)) missingMember(json, key);
+            if (!zrjson::getStringMember(json, key.c_str(), text, zrjson::OnNull::fail)) missingMember(json, key);
             *value = getClockAccuracyCodeFromString(text);
         } catch (const zrerr::ExceptionBase& e) {
             if (e.code() != -52004) throw;
-            zrjson::getInt32NumberMember(json, key.c_str(), *value);  // the service sent the code as a number
+            // The service sent the code as a number.
+            zrjson::getInt32NumberMember(json, key.c_str(), *value, zrjson::OnNull::fail);
         }
     } else if (attribute == TIKTAL_ATTR_8021AS_NEIGHBOR_PROP_DELAY_THRESHOLD) {
         *value = zrjson::getInt32Member(getTrAttr(terminalName, key), key.c_str());
     } else {
         const std::string json = getTrAttr(terminalName, key);
-        if (!zrjson::getInt32NumberMember(json, key.c_str(), *value)) missingMember(json, key);
+        if (!zrjson::getInt32NumberMember(json, key.c_str(), *value, zrjson::OnNull::fail)) missingMember(json, key);
     }
 }
 
@@ -157,7 +165,7 @@ void HorloSession::getAttributeViReal64(ViConstString terminalName, ViAttr attri
     } else if (attribute == TIKTAL_ATTR_SELECTED_TIME_REFERENCE_OFFSET_NS) {
         *value = static_cast<double>(getSelectedTrOffsetNanos());
     } else {
-        *value = boost::lexical_cast<double>(readTrAttrText(terminalName, key));  // the service sends a text
+        *value = finite(boost::lexical_cast<double>(readTrAttrText(terminalName, key)));  // the service sends a text
     }
 }
 

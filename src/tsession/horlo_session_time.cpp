@@ -21,9 +21,9 @@ std::vector<std::string> HorloSession::timeReferenceNames() {
     const zrjsonlh::CppJson parsed(json.c_str());
     const cJSON* names = zrjsonlh::getObjectItem(parsed.get(), "allTimeReferences");
     std::vector<std::string> list;
-    const int count = cJSON_IsArray(names) ? cJSON_GetArraySize(names) : 0;  // a scalar has no elements
-    for (int i = 0; i < count; ++i)
-        list.push_back(zrjsonlh::getString(zrjsonlh::getArrayItem(names, static_cast<std::uint32_t>(i))));
+    if (!cJSON_IsArray(names) && !cJSON_IsObject(names)) return list;  // a scalar has no elements
+    for (auto it = zrjsonlh::ArrayIterator::begin(names); it != zrjsonlh::ArrayIterator::end(); ++it)
+        list.push_back(zrjsonlh::getString(*it));
     return list;
 }
 
@@ -48,7 +48,9 @@ void HorloSession::getTime(ViUInt32* timeSeconds, ViUInt32* timeNanoseconds, ViU
             .debug("message", "Failed to parse attribute from Horlo metadata.")
             .debug("json", json)
             .debug("key", "epochOffsetInNsec");
-    const std::uint64_t nanos = boost::lexical_cast<std::uint64_t>(text);  // "-n" wraps modulo 2^64
+    // The count is never negative: "-0" is 0, and "-n" fails as any other text that is no count.
+    const std::uint64_t nanos = boost::lexical_cast<std::uint64_t>(text);
+    if (nanos != 0 && !text.empty() && text[0] == '-') throw boost::bad_lexical_cast();
     const std::uint64_t seconds = nanos / kNanosPerSecond;
     if (seconds > 4294967295u) throw ZRERR_RAISE(tiktalerr_overflow).debug("func", "tiktal::HorloSession::getTime");
     *timeSeconds = static_cast<ViUInt32>(seconds);

@@ -35,7 +35,12 @@ TEST(Open, OnlyTheTraceResourceOpensAndItsNameIgnoresCase) {
             EXPECT_EQ(tiktal_close(vi), VI_SUCCESS);
         }
         for (const char* name : {"", "SyncTestInternal__", "SyncTestInternal____", " SyncTestInternal___",
-                                 "SyncTestInternal___ ", "SyncTestInternal", "sync://localhost/Dev1", "PXI1Slot2"}) {
+                                 "SyncTestInternal___ ", "SyncTestInternal", "sync://localhost/Dev1", "PXI1Slot2",
+                                 // Byte sequences that are not UTF-8 for "S": two- to four-byte overlong
+                                 // forms, and a code point beyond U+10FFFF whose low bits are those of "S".
+                                 "\xC1\x93yncTestInternal___", "\xE0\x81\x93yncTestInternal___",
+                                 "\xF0\x80\x81\x93yncTestInternal___", "\xF4\x90\x81\x93yncTestInternal___",
+                                 "SyncTestInternal\xC1\x9F__"}) {
             ViSession vi = 0xDEADBEEF;
             EXPECT_EQ(open(name, VI_FALSE, &vi), tiktalerr_deviceNotFound) << function << " '" << name << "'";
             EXPECT_EQ(vi, 0u) << function << " '" << name << "'";

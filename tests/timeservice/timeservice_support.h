@@ -7,6 +7,7 @@
 #include <tiktal/tiktal.h>
 
 #include <cstdio>
+#include <functional>
 #include <memory>
 #include <ostream>
 #include <string>
@@ -128,6 +129,57 @@ public:
 private:
     ViSession _vi = 0;
     ViStatus _status;
+};
+
+// One simulator per suite; every test starts from its default state with a fresh session.
+class TimeService : public ::testing::Test {
+protected:
+    static void SetUpTestSuite() {
+        sim = new TimeServiceSim();
+        defaultState = new std::string(sim->state());
+    }
+    static void TearDownTestSuite() {
+        delete sim;
+        delete defaultState;
+        sim = nullptr;
+        defaultState = nullptr;
+    }
+    void SetUp() override {
+        sim->replaceState(*defaultState);
+        sim->reset();
+        ASSERT_STATUS(tiktal_init(sim->resource().c_str(), VI_FALSE, VI_FALSE, &vi), VI_SUCCESS);
+        sim->reset();  // each test counts its own requests
+    }
+    void TearDown() override {
+        if (vi) tiktal_close(vi);
+    }
+
+    // Service requests answered while `call` runs.
+    static long servedDuring(const std::function<void()>& call) {
+        const long before = sim->served();
+        call();
+        return sim->served() - before;
+    }
+    // Sets member `key` of time reference `tr` to the JSON value `value`.
+    static void setMember(const std::string& tr, const std::string& key, const std::string& value) {
+        sim->mergeState(R"({"timeReferences":{)" + quoted(tr) + ":{" + quoted(key) + ":" + value + "}}}");
+    }
+    // Replaces the whole set of time references, keeping the rest of the default state.
+    static void setReferences(const std::string& references) {
+        Json state = parse(*defaultState);
+        cJSON_ReplaceItemInObjectCaseSensitive(state.get(), "timeReferences", cJSON_Parse(references.c_str()));
+        sim->replaceState(print(state.get()));
+    }
+    // The next service request is answered with HTTP 200 and `body` (after `skip` requests answered
+    // normally).
+    static void answerWith(const std::string& body, int skip = 0) {
+        if (skip > 0) sim->next(R"({"count":)" + std::to_string(skip) + "}");
+        sim->next(R"({"status":200,"body":)" + quoted(body) + "}");
+    }
+
+    inline static TimeServiceSim* sim = nullptr;
+    inline static std::string* defaultState = nullptr;
+    ViSession vi = 0;
 };
 
 }  // namespace ts

@@ -12,59 +12,6 @@ using namespace ts;
 
 constexpr char kMediaType[] = "vnd.zr.tiktal.v1/json; charset=utf-8";
 
-// One simulator per suite; every test starts from its default state with a fresh session.
-class TimeService : public ::testing::Test {
-protected:
-    static void SetUpTestSuite() {
-        sim = new TimeServiceSim();
-        defaultState = new std::string(sim->state());
-    }
-    static void TearDownTestSuite() {
-        delete sim;
-        delete defaultState;
-        sim = nullptr;
-        defaultState = nullptr;
-    }
-    void SetUp() override {
-        sim->replaceState(*defaultState);
-        sim->reset();
-        ASSERT_STATUS(tiktal_init(sim->resource().c_str(), VI_FALSE, VI_FALSE, &vi), VI_SUCCESS);
-        sim->reset();  // each test counts its own requests
-    }
-    void TearDown() override {
-        if (vi) tiktal_close(vi);
-    }
-
-    // Service requests answered while `call` runs.
-    static long servedDuring(const std::function<void()>& call) {
-        const long before = sim->served();
-        call();
-        return sim->served() - before;
-    }
-    // Sets member `key` of time reference `tr` to the JSON value `value`.
-    static void setMember(const std::string& tr, const std::string& key, const std::string& value) {
-        sim->mergeState(R"({"timeReferences":{)" + quoted(tr) + ":{" + quoted(key) + ":" + value + "}}}");
-    }
-    // Replaces the whole set of time references, keeping the rest of the default state.
-    static void setReferences(const std::string& references) {
-        Json state = parse(*defaultState);
-        cJSON_ReplaceItemInObjectCaseSensitive(state.get(), "timeReferences", cJSON_Parse(references.c_str()));
-        sim->replaceState(print(state.get()));
-    }
-    // The next service request is answered with HTTP 200 and `body` (after `skip` requests answered
-    // normally).
-    static void answerWith(const std::string& body, int skip = 0) {
-        if (skip > 0) sim->next(R"({"count":)" + std::to_string(skip) + "}");
-        sim->next(R"({"status":200,"body":)" + quoted(body) + "}");
-    }
-
-    static TimeServiceSim* sim;
-    static std::string* defaultState;
-    ViSession vi = 0;
-};
-TimeServiceSim* TimeService::sim = nullptr;
-std::string* TimeService::defaultState = nullptr;
-
 TEST_F(TimeService, OpensOnlyTheServicesOneDeviceOrItsAliasSystem) {
     {
         Session system(sim->resource("system"));
@@ -132,6 +79,65 @@ TEST_F(TimeService, ReadsEachAttributeTypeThroughItsAccessor) {
     EXPECT_EQ(booleanOf(vi, "PTP1", TIKTAL_ATTR_TIME_REFERENCE_ENABLED), ok(VI_TRUE));
     EXPECT_EQ(booleanOf(vi, "TAB1", TIKTAL_ATTR_TIME_REFERENCE_ENABLED), ok(VI_FALSE));
     EXPECT_EQ(booleanOf(vi, "AS1", TIKTAL_ATTR_8021AS_AS_CAPABLE), ok(VI_TRUE));
+}
+
+TEST_F(TimeService, ReadsTheGrandmasterAndPeerMembersOfEachClockType) {
+    setMember("PTP1", "gmPriority1", "11");
+    setMember("PTP1", "gmPriority2", "12");
+    setMember("BC1", "gmPriority1", "21");
+    setMember("BC1", "gmPriority2", "22");
+    setMember("AS1", "priority2", "31");
+    setMember("AS1", "clockClass", "32");
+    setMember("AS1", "localClockId", R"("AS1-LOCAL")");
+    setMember("AS1", "gmClockClass", "33");
+    setMember("AS1", "gmClockId", R"("AS1-GM")");
+    setMember("AS1", "gmPriority1", "34");
+    setMember("AS1", "gmPriority2", "35");
+    setMember("TAB1", "clockClass", "41");
+    setMember("TAB1", "localClockId", R"("TAB1-LOCAL")");
+    setMember("TAB1", "gmPriority2", "42");
+
+    const struct {
+        const char* tr;
+        ViAttr attribute;
+        ViInt32 value;
+        const char* path;
+    } numbers[] = {
+        {"PTP1", TIKTAL_ATTR_1588_GM_PRIORITY1, 11, "/tiktalwebs/sync_1/PTP1/gmPriority1"},
+        {"PTP1", TIKTAL_ATTR_1588_GM_PRIORITY2, 12, "/tiktalwebs/sync_1/PTP1/gmPriority2"},
+        {"BC1", TIKTAL_ATTR_1588_GM_PRIORITY1, 21, "/tiktalwebs/sync_1/BC1/gmPriority1"},
+        {"BC1", TIKTAL_ATTR_1588_GM_PRIORITY2, 22, "/tiktalwebs/sync_1/BC1/gmPriority2"},
+        {"AS1", TIKTAL_ATTR_8021AS_PRIORITY2, 31, "/tiktalwebs/sync_1/AS1/priority2"},
+        {"AS1", TIKTAL_ATTR_8021AS_CLOCK_CLASS, 32, "/tiktalwebs/sync_1/AS1/clockClass"},
+        {"AS1", TIKTAL_ATTR_8021AS_GM_CLOCK_CLASS, 33, "/tiktalwebs/sync_1/AS1/gmClockClass"},
+        {"AS1", TIKTAL_ATTR_8021AS_GM_PRIORITY1, 34, "/tiktalwebs/sync_1/AS1/gmPriority1"},
+        {"AS1", TIKTAL_ATTR_8021AS_GM_PRIORITY2, 35, "/tiktalwebs/sync_1/AS1/gmPriority2"},
+        {"TAB1", TIKTAL_ATTR_8021AS_CLOCK_CLASS, 41, "/tiktalwebs/sync_1/TAB1/clockClass"},
+        {"TAB1", TIKTAL_ATTR_8021AS_GM_PRIORITY2, 42, "/tiktalwebs/sync_1/TAB1/gmPriority2"},
+    };
+    for (const auto& n : numbers) {
+        EXPECT_EQ(int32Of(vi, n.tr, n.attribute), ok(n.value)) << n.path;
+        EXPECT_EQ(lastRequest(*sim).path, n.path);
+    }
+    const struct {
+        const char* tr;
+        ViAttr attribute;
+        const char* value;
+        const char* path;
+    } texts[] = {
+        {"AS1", TIKTAL_ATTR_8021AS_CLOCK_ID, "AS1-LOCAL", "/tiktalwebs/sync_1/AS1/localClockId"},
+        {"AS1", TIKTAL_ATTR_8021AS_GM_CLOCK_ID, "AS1-GM", "/tiktalwebs/sync_1/AS1/gmClockId"},
+        {"TAB1", TIKTAL_ATTR_8021AS_CLOCK_ID, "TAB1-LOCAL", "/tiktalwebs/sync_1/TAB1/localClockId"},
+    };
+    for (const auto& t : texts) {
+        EXPECT_EQ(stringOf(vi, t.tr, t.attribute), ok(t.value)) << t.path;
+        EXPECT_EQ(lastRequest(*sim).path, t.path);
+    }
+
+    // Each belongs to its own kind of clock only.
+    EXPECT_STATUS(int32Of(vi, "AS1", TIKTAL_ATTR_1588_GM_PRIORITY1).status, tiktalerr_trTypeMismatch);
+    EXPECT_STATUS(int32Of(vi, "PTP1", TIKTAL_ATTR_8021AS_GM_PRIORITY2).status, tiktalerr_trTypeMismatch);
+    EXPECT_STATUS(stringOf(vi, "BC1", TIKTAL_ATTR_8021AS_CLOCK_ID).status, tiktalerr_trTypeMismatch);
 }
 
 TEST_F(TimeService, ChecksIdentifierNameAndAccessorTypeInThatOrder) {
@@ -383,7 +389,11 @@ TEST_F(TimeService, SplitsTheServiceTimeIntoSecondsAndNanoseconds) {
         {R"("-0")", VI_SUCCESS, 0u, 0u},
         {R"("4294967295999999999")", VI_SUCCESS, 4294967295u, 999999999u},
         {R"("4294967296000000000")", tiktalerr_overflow, 7u, 7u},
-        {R"("-1")", tiktalerr_overflow, 7u, 7u},
+        // A negative count is no time, whatever it comes to modulo 2^64.
+        {R"("-1")", tiktalerr_internalSoftware, 7u, 7u},
+        {R"("-1000000000")", tiktalerr_internalSoftware, 7u, 7u},
+        {R"("-18446744073709551615")", tiktalerr_internalSoftware, 7u, 7u},
+        {R"("-00")", VI_SUCCESS, 0u, 0u},
         {R"("abc")", tiktalerr_internalSoftware, 7u, 7u},
         {R"("")", tiktalerr_internalSoftware, 7u, 7u},
         {R"("12 ")", tiktalerr_internalSoftware, 7u, 7u},
@@ -409,8 +419,6 @@ TEST_F(TimeService, SplitsTheServiceTimeIntoSecondsAndNanoseconds) {
 }
 
 TEST_F(TimeService, ReadsMembersThatAreNullOddlySpelledOrOddlyTyped) {
-    setMember("PTP1", "priority1", "null");
-    EXPECT_EQ(int32Of(vi, "PTP1", TIKTAL_ATTR_1588_PRIORITY1, 77), ok(77));
     setMember("PTP1", "isEnabled", "null");
     EXPECT_EQ(booleanOf(vi, "PTP1", TIKTAL_ATTR_TIME_REFERENCE_ENABLED, VI_TRUE), ok(VI_FALSE));
 
