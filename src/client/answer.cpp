@@ -10,8 +10,6 @@
 namespace zr::vantle::shared {
 namespace {
 
-#define TCURL_RAISE(constant) ::zrerr::raise((constant), #constant, ZRERR_FILE, __LINE__, "zrgvshared_debug")
-
 // The status an "errorCode" stands for. Codes written as unsigned 32-bit numbers
 // (3220848643 for 0xBFFA4003) wrap as a C conversion would; a code that does not come out as an
 // error (a warning, 0, a fraction, out of range) stands for nothing.

@@ -11,8 +11,6 @@ namespace {
 
 namespace lib = curllib;
 
-#define TCURL_RAISE(constant) ::zrerr::raise((constant), #constant, ZRERR_FILE, __LINE__, "zrgvshared_debug")
-
 // Appends to the answer; an answer that grows beyond kMaxAnswerBytes aborts the transfer.
 size_t writeCallback(char* data, size_t size, size_t count, void* user) {
     if (!user) return 0;

@@ -26,6 +26,9 @@ inline constexpr std::int32_t kInternalSoftwareErrorUnknownNetworkError = -41136
 inline constexpr std::int32_t kNetworkClientUnsupportedMediaType = -411370;
 inline constexpr std::int32_t kNetworkClientInProgress = 411369;
 
+// Raises one of the statuses above; the transport's site members go into "zrgvshared_debug".
+#define TCURL_RAISE(constant) ::zrerr::raise((constant), #constant, ZRERR_FILE, __LINE__, "zrgvshared_debug")
+
 class iCURL {
 public:
     virtual ~iCURL() = default;
