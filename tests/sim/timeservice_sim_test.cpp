@@ -15,6 +15,7 @@
 #include <set>
 #include <sstream>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include <unistd.h>
@@ -40,12 +41,20 @@ struct Reply {
     long status = 0;
     std::string body;
     std::string contentType;
+    std::string headers;            // the header lines as received
+    curl_off_t contentLength = -1;  // -1 without a Content-Length
+    long connects = 0;              // connections the request opened; 0 when it reused one
+
+    bool chunked() const { return headers.find("Transfer-Encoding: chunked\r\n") != std::string::npos; }
 };
 
 size_t appendBody(char* data, size_t size, size_t count, void* target) {
     static_cast<std::string*>(target)->append(data, size * count);
     return size * count;
 }
+
+using Handle = std::unique_ptr<CURL, decltype(&curl_easy_cleanup)>;
+Handle newHandle() { return Handle(curl_easy_init(), curl_easy_cleanup); }
 
 // Hands out the upload text piece by piece; libcurl learns no size, so the body travels chunked,
 // as it does from the driver's transport.
@@ -57,9 +66,9 @@ size_t readUpload(char* buffer, size_t size, size_t count, void* source) {
     return n;
 }
 
-Reply request(const std::string& method, const std::string& url, std::string upload = {}) {
+// One request on `curl`, which keeps its connection for the next one.
+Reply request(CURL* curl, const std::string& method, const std::string& url, std::string upload = {}) {
     Reply reply;
-    CURL* curl = curl_easy_init();
     curl_slist* headers = curl_slist_append(nullptr, "Accept: vnd.zr.tiktal.v1/json; charset=utf-8");
     headers = curl_slist_append(headers, "Content-Type: vnd.zr.tiktal.v1/json; charset=utf-8");
     curl_easy_setopt(curl, CURLOPT_URL, url.c_str());
@@ -67,8 +76,10 @@ Reply request(const std::string& method, const std::string& url, std::string upl
     curl_easy_setopt(curl, CURLOPT_NOSIGNAL, 1L);
     curl_easy_setopt(curl, CURLOPT_WRITEFUNCTION, appendBody);
     curl_easy_setopt(curl, CURLOPT_WRITEDATA, &reply.body);
+    curl_easy_setopt(curl, CURLOPT_HEADERFUNCTION, appendBody);
+    curl_easy_setopt(curl, CURLOPT_HEADERDATA, &reply.headers);
+    curl_easy_setopt(curl, CURLOPT_UPLOAD, method == "PUT" ? 1L : 0L);
     if (method == "PUT") {
-        curl_easy_setopt(curl, CURLOPT_UPLOAD, 1L);
         curl_easy_setopt(curl, CURLOPT_READFUNCTION, readUpload);
         curl_easy_setopt(curl, CURLOPT_READDATA, &upload);
     }
@@ -77,9 +88,16 @@ Reply request(const std::string& method, const std::string& url, std::string upl
     const char* type = nullptr;
     curl_easy_getinfo(curl, CURLINFO_CONTENT_TYPE, &type);
     reply.contentType = type ? type : "";
+    curl_easy_getinfo(curl, CURLINFO_CONTENT_LENGTH_DOWNLOAD_T, &reply.contentLength);
+    curl_easy_getinfo(curl, CURLINFO_NUM_CONNECTS, &reply.connects);
+    curl_easy_setopt(curl, CURLOPT_HTTPHEADER, nullptr);
     curl_slist_free_all(headers);
-    curl_easy_cleanup(curl);
     return reply;
+}
+
+// One request on a handle of its own, so on a connection of its own.
+Reply request(const std::string& method, const std::string& url, std::string upload = {}) {
+    return request(newHandle().get(), method, url, std::move(upload));
 }
 
 std::string putBody(const std::string& key, const std::string& value) {
@@ -382,23 +400,151 @@ TEST(TimeServiceSimulator, CounterCountsServiceRequestsAndResetClearsIt) {
     EXPECT_EQ(sim.served(), 1);
 }
 
-TEST(TimeServiceSimulator, ListensOnLoopbackOnlyAndStopsCleanly) {
+TEST(TimeServiceSimulator, ListensOnLoopbackOnly) {
     for (const char* address : {"0.0.0.0", "192.0.2.1", "localhost", "::"}) {
         SCOPED_TRACE(address);
         EXPECT_THROW(TimeServiceSim({"", address, ""}), std::runtime_error);
     }
     TimeServiceSim sim({"", "127.1.2.3", ""});
-    // A client handle that stays open, as a driver session keeps its own, does not hold the stop up.
-    std::unique_ptr<CURL, decltype(&curl_easy_cleanup)> open(curl_easy_init(), curl_easy_cleanup);
+    EXPECT_EQ(get(sim.url("/tiktalwebs/devices")).status, 200);
+}
+
+TEST(TimeServiceSimulator, RequestsOnOneHandleShareOneConnectionCountedOncePerReset) {
+    TimeServiceSim sim;
+    const Handle client = newHandle();
+    EXPECT_EQ(request(client.get(), "GET", sim.url("/tiktalwebs/devices")).connects, 1);
+    EXPECT_EQ(request(client.get(), "PUT", sim.url(kDevice + "/PTP1/priority1"), putBody("priority1", "9")).connects, 0);
+    EXPECT_EQ(request(client.get(), "GET", sim.url(kDevice + "/PTP1/priority1")).connects, 0);
+    EXPECT_EQ(sim.served(), 3);
+    EXPECT_EQ(sim.connections(), 1);  // the test controls' own connections do not count
+
+    get(sim.url("/tiktalwebs/devices"));  // another handle, another connection
+    EXPECT_EQ(sim.connections(), 2);
+    sim.reset();
+    EXPECT_EQ(sim.connections(), 0);
+    // The kept-alive connection from before the reset counts again, once.
+    EXPECT_EQ(request(client.get(), "GET", sim.url("/tiktalwebs/devices")).connects, 0);
+    EXPECT_EQ(request(client.get(), "GET", sim.url("/tiktalwebs/devices")).connects, 0);
+    EXPECT_EQ(sim.connections(), 1);
+}
+
+// The simulator keeps an idle connection open for 60 s, and stop() gives up after 10 s and kills it
+// (exit status 128 + 9): a clean exit shows that the stop ended the idle connections at once.
+TEST(TimeServiceSimulator, StopEndsIdleKeptAliveConnectionsAtOnce) {
+    TimeServiceSim sim;
+    const Handle session = newHandle();  // kept open, as a driver session keeps its own
+    request(session.get(), "GET", sim.url("/tiktalwebs/devices"));
+    ASSERT_EQ(request(session.get(), "GET", sim.url("/tiktalwebs/devices")).connects, 0);  // kept alive
+    const Handle silent = newHandle();  // connected, never sends a request
+    curl_easy_setopt(silent.get(), CURLOPT_URL, sim.url("/").c_str());
+    curl_easy_setopt(silent.get(), CURLOPT_CONNECT_ONLY, 1L);
+    ASSERT_EQ(curl_easy_perform(silent.get()), CURLE_OK);
+
+    EXPECT_EQ(sim.stop(), 0);
+    EXPECT_EQ(sim.stop(), 0);
     std::string body;
+    curl_easy_setopt(session.get(), CURLOPT_WRITEFUNCTION, appendBody);
+    curl_easy_setopt(session.get(), CURLOPT_WRITEDATA, &body);
+    EXPECT_NE(curl_easy_perform(session.get()), CURLE_OK);  // it is gone
+}
+
+TEST(TimeServiceSimulator, RepeatStreamsTheBodyWithItsContentLengthOrChunked) {
+    TimeServiceSim sim;
     const std::string url = sim.url("/tiktalwebs/devices");
-    curl_easy_setopt(open.get(), CURLOPT_URL, url.c_str());
-    curl_easy_setopt(open.get(), CURLOPT_WRITEFUNCTION, appendBody);
-    curl_easy_setopt(open.get(), CURLOPT_WRITEDATA, &body);
-    ASSERT_EQ(curl_easy_perform(open.get()), CURLE_OK);
-    EXPECT_EQ(sim.stop(), 0);
-    EXPECT_EQ(sim.stop(), 0);
-    EXPECT_NE(curl_easy_perform(open.get()), CURLE_OK);  // it is gone
+    const Reply normal = get(url);
+    EXPECT_EQ(normal.contentLength, static_cast<curl_off_t>(normal.body.size()));
+
+    sim.next(R"({"repeat":3,"body":"abc","status":503})");
+    const Reply three = get(url);
+    EXPECT_EQ(three.status, 503);
+    EXPECT_EQ(three.body, "abcabcabc");
+    EXPECT_EQ(three.contentLength, 9);
+    EXPECT_FALSE(three.chunked());
+    EXPECT_EQ(three.contentType, "vnd.zr.tiktal.v1/json; charset=utf-8");
+    EXPECT_EQ(sim.streamed(), 9);
+
+    // A text of 7 bytes repeated past a megabyte: the pieces that the server sends begin anywhere
+    // within the text.
+    sim.next(R"({"repeat":150001,"body":"0123456"})");
+    sim.next(R"({"repeat":150001,"body":"0123456","chunked":true})");
+    for (const bool chunked : {false, true}) {
+        SCOPED_TRACE(chunked ? "chunked" : "with Content-Length");
+        const Reply answer = get(url);
+        ASSERT_EQ(answer.body.size(), 1050007u);
+        std::size_t wrong = 0;
+        while (wrong < answer.body.size() && answer.body[wrong] == static_cast<char>('0' + wrong % 7)) ++wrong;
+        EXPECT_EQ(wrong, answer.body.size()) << "the first wrong byte";
+        EXPECT_EQ(answer.chunked(), chunked);
+        EXPECT_EQ(answer.contentLength, chunked ? -1 : 1050007);
+    }
+    EXPECT_EQ(sim.streamed(), 9 + 2 * 1050007);
+
+    sim.next(R"({"chunked":true})");  // without "repeat": the normal answer, chunked
+    const Reply chunkedNormal = get(url);
+    EXPECT_TRUE(chunkedNormal.chunked());
+    EXPECT_EQ(chunkedNormal.body, normal.body);
+    EXPECT_EQ(sim.streamed(), 9 + 2 * 1050007 + static_cast<long long>(normal.body.size()));
+    sim.reset();
+    EXPECT_EQ(sim.streamed(), 0);
+}
+
+TEST(TimeServiceSimulator, RefusesRepeatWithoutABodyOrOutOfRange) {
+    TimeServiceSim sim;
+    // 2^40 repeats of 8192 bytes make 2^53 bytes, the longest body the stats count exactly.
+    const auto terabytes = [](std::size_t size) {
+        return R"({"repeat":1099511627776,"body":")" + std::string(size, 'x') + R"("})";
+    };
+    const std::vector<std::string> refused = {R"({"repeat":3})",
+                                              R"({"repeat":3,"body":""})",
+                                              R"({"repeat":0,"body":"x"})",
+                                              R"({"repeat":-1,"body":"x"})",
+                                              R"({"repeat":1099511627777,"body":"x"})",  // 2^40 + 1
+                                              R"({"repeat":2.5,"body":"x"})",
+                                              R"({"repeat":"3","body":"x"})",
+                                              R"({"chunked":1})",
+                                              terabytes(8193)};
+    for (const std::string& directive : refused) {
+        SCOPED_TRACE(directive.substr(0, 60));
+        EXPECT_THROW(sim.next(directive), std::runtime_error);
+    }
+    EXPECT_EQ(get(sim.url("/tiktalwebs/devices")).contentLength, 34);  // refused directives were not queued
+    EXPECT_NO_THROW(sim.next(terabytes(8192)));
+}
+
+// Reads a GET's body until `enough` bytes have come, then gives up: libcurl closes the connection.
+CURLcode giveUpAfter(const std::string& url, std::size_t enough) {
+    struct Reader {
+        std::size_t got = 0, enough = 0;
+        static size_t take(char*, size_t size, size_t count, void* self) {
+            auto* reader = static_cast<Reader*>(self);
+            reader->got += size * count;
+            return reader->got < reader->enough ? size * count : 0;
+        }
+    } reader;
+    reader.enough = enough;
+    const Handle curl = newHandle();
+    curl_easy_setopt(curl.get(), CURLOPT_URL, url.c_str());
+    curl_easy_setopt(curl.get(), CURLOPT_WRITEFUNCTION, Reader::take);
+    curl_easy_setopt(curl.get(), CURLOPT_WRITEDATA, &reader);
+    return curl_easy_perform(curl.get());
+}
+
+TEST(TimeServiceSimulator, AClientThatGivesUpEndsTheStreamLongBeforeItsEnd) {
+    TimeServiceSim sim;
+    for (const char* directive : {R"({"repeat":1099511627776,"body":"x"})",  // a terabyte
+                                  R"({"repeat":1099511627776,"body":"x","chunked":true})"}) {
+        SCOPED_TRACE(directive);
+        sim.reset();
+        sim.next(directive);
+        EXPECT_EQ(giveUpAfter(sim.url("/tiktalwebs/devices"), 1 << 20), CURLE_WRITE_ERROR);
+        const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+        while (sim.streaming() > 0) {
+            ASSERT_LT(std::chrono::steady_clock::now(), deadline) << "the stream went on after the client left";
+            std::this_thread::sleep_for(std::chrono::milliseconds(5));
+        }
+        EXPECT_GE(sim.streamed(), 1 << 20);
+        EXPECT_LT(sim.streamed(), 256LL << 20);  // what the sockets' buffers held, not the terabyte
+    }
 }
 
 }  // namespace

@@ -48,11 +48,11 @@ size_t appendBody(char* data, size_t size, size_t count, void* target) {
     return size * count;
 }
 
-long numberMember(const std::string& json, const char* name) {
+long long numberMember(const std::string& json, const char* name) {
     std::unique_ptr<cJSON, decltype(&cJSON_Delete)> parsed(cJSON_Parse(json.c_str()), cJSON_Delete);
     const cJSON* member = cJSON_GetObjectItemCaseSensitive(parsed.get(), name);
     if (!cJSON_IsNumber(member)) throw failure(std::string("no number \"") + name + "\" in " + json);
-    return static_cast<long>(member->valuedouble);
+    return static_cast<long long>(member->valuedouble);
 }
 
 }  // namespace
@@ -189,8 +189,12 @@ std::string TimeServiceSim::control(const char* method, const std::string& path,
 }
 
 void TimeServiceSim::next(const std::string& directiveJson) { control("POST", "/_sim/next", directiveJson); }
-long TimeServiceSim::served() { return numberMember(control("GET", "/_sim/stats"), "served"); }
-long TimeServiceSim::held() { return numberMember(control("GET", "/_sim/stats"), "held"); }
+long long TimeServiceSim::stat(const char* name) { return numberMember(control("GET", "/_sim/stats"), name); }
+long TimeServiceSim::served() { return static_cast<long>(stat("served")); }
+long TimeServiceSim::held() { return static_cast<long>(stat("held")); }
+long TimeServiceSim::connections() { return static_cast<long>(stat("connections")); }
+long long TimeServiceSim::streamed() { return stat("streamed"); }
+long TimeServiceSim::streaming() { return static_cast<long>(stat("streaming")); }
 std::string TimeServiceSim::lastRequest() { return control("GET", "/_sim/last"); }
 void TimeServiceSim::reset() { control("POST", "/_sim/reset"); }
 void TimeServiceSim::release() { control("POST", "/_sim/release"); }

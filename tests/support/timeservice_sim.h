@@ -42,15 +42,26 @@ public:
 
     // Queues a directive for the next service requests, for example
     // {"count":2,"status":404}, {"delayMs":60000}, {"body":""}, {"wrapResult":true},
-    // {"error":{"success":false,"errorCode":-123,"errorText":"t","errorInfo":"i"}}.
+    // {"error":{"success":false,"errorCode":-123,"errorText":"t","errorInfo":"i"}},
+    // {"repeat":1073741824,"body":"x"} (a body of 1 GiB, streamed, with its Content-Length),
+    // {"repeat":3,"body":"abc","chunked":true} (streamed with chunked transfer encoding),
+    // {"chunked":true} (the normal answer, streamed chunked).
     void next(const std::string& directiveJson);
     // Service requests answered so far.
     long served();
     // Service requests waiting in a delay now.
     long held();
+    // Connections that carried a service request since the start or the last reset(); a kept-alive
+    // connection that predates the reset counts again with its next service request. The test
+    // controls' own connections do not count.
+    long connections();
+    // Bytes of streamed bodies ("repeat" or "chunked") that the server handed to the socket.
+    long long streamed();
+    // Streamed answers being sent now; 0 once every stream has ended, whole or cut off.
+    long streaming();
     // The last service request as JSON: {"method","path","query","body","headers":{...}}; "{}" before any.
     std::string lastRequest();
-    // Clears the directives, the counter and the last request.
+    // Clears the directives, the counters (served, connections, streamed) and the last request.
     void reset();
     // Ends every delay that runs now.
     void release();
@@ -66,6 +77,7 @@ public:
 
 private:
     std::string control(const char* method, const std::string& path, const std::string& body = {});
+    long long stat(const char* name);  // one number of GET /_sim/stats
     void removeTemporaryFolder() noexcept;
 
     std::string _program;
