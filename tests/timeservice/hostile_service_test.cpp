@@ -1,6 +1,9 @@
 // Time-service sessions against a service that answers in hostile or broken ways, and callers that
 // give hostile resource names: every case must fail with a clear error status, store nothing, and
 // neither crash the caller nor report success or a warning.
+#include <chrono>
+#include <thread>
+
 #include "timeservice_support.h"
 
 namespace {
@@ -164,6 +167,21 @@ TEST_F(TimeService, AnswersAreTakenUpToTheLimitAndRefusedBeyondIt) {
     const std::string tooLarge = head + std::string(kMaxAnswerBytes - head.size() - tail.size() + 1, 'n') + tail;
     answerWith(tooLarge);
     EXPECT_EQ(namesOf(vi), Read<std::string>({tiktalerr_remoteDeviceCommunicationFailure, ""}));
+
+    // A service that sends a gigabyte is cut off once the limit is passed (or, when it announces
+    // its length, before the body): the service stops long before the end.
+    for (const char* chunked : {"false", "true"}) {
+        sim->reset();
+        sim->next(std::string(R"({"repeat":1073741824,"body":"n","chunked":)") + chunked + "}");
+        EXPECT_EQ(namesOf(vi), Read<std::string>({tiktalerr_remoteDeviceCommunicationFailure, ""})) << chunked;
+        const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+        while (sim->streaming() > 0) {
+            ASSERT_LT(std::chrono::steady_clock::now(), deadline) << "the answer went on after the session left";
+            std::this_thread::sleep_for(std::chrono::milliseconds(5));
+        }
+        EXPECT_LT(sim->streamed(), 64LL << 20) << chunked;  // the limit and the sockets' buffers, no more
+    }
+    EXPECT_EQ(int32Of(vi, "PTP1", TIKTAL_ATTR_1588_PRIORITY1), ok(128));  // the session goes on
 }
 
 TEST_F(TimeService, HostsThatWouldSendTheRequestElsewhereAreNotTimeServices) {
