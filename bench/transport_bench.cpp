@@ -1,9 +1,11 @@
 // Round trips to the time-service simulator, each beside a plain libcurl easy-handle loop on the
 // same URLs: one GET through the transport (loaded HTTP library, envelope check, unwrapping), and
-// an Int32 attribute read through the C interface (two requests: the type, then the value).
+// an Int32 attribute read through the C interface (two requests: the type, then the value), and
+// the names of a service with a hundred thousand time references (one request of about 1.2 MB).
 // Each side sends all its requests over one kept-alive connection; a benchmark whose requests the
 // simulator saw on any other number of connections reports an error instead of a time.
 #include <benchmark/benchmark.h>
+#include <cjson/cJSON.h>
 #include <curl/curl.h>
 
 #include <cstdlib>
@@ -92,10 +94,52 @@ void SessionGetAttributeViInt32(benchmark::State& state) {
 // The same two requests as SessionGetAttributeViInt32 sends, on one kept-alive connection.
 void PlainLibcurlTypeThenValue(benchmark::State& state) { plainGets(state, {"sync_1/PTP1/type", "sync_1/PTP1/priority1"}); }
 
+// A service with kManyReferences time references while `body` runs; the state is restored after.
+constexpr int kManyReferences = 100000;
+template <typename Body>
+void withManyReferences(Body body) {
+    const std::string saved = gSim->state();
+    cJSON* many = cJSON_Parse(saved.c_str());
+    cJSON* references = cJSON_CreateObject();
+    for (int i = 0; i < kManyReferences; ++i)
+        cJSON_AddItemToObject(cJSON_AddObjectToObject(references, ("TR" + std::to_string(i)).c_str()), "type",
+                              cJSON_CreateString("IEEE 1588-2008"));
+    cJSON_ReplaceItemInObjectCaseSensitive(many, "timeReferences", references);
+    char* text = cJSON_PrintUnformatted(many);
+    gSim->replaceState(text);
+    cJSON_free(text);
+    cJSON_Delete(many);
+    body();
+    gSim->replaceState(saved);
+}
+
+void SessionGetTimeReferenceNames100k(benchmark::State& state) {
+    ViSession vi = 0;
+    if (tiktal_init(gSim->resource().c_str(), VI_FALSE, VI_FALSE, &vi) != VI_SUCCESS) {
+        state.SkipWithError("tiktal_init failed");
+        return;
+    }
+    std::vector<ViChar> names(4 << 20);
+    withManyReferences([&] {
+        onOneConnection(state, [&] {
+            for (auto _ : state)
+                benchmark::DoNotOptimize(tiktal_GetTimeReferenceNames(vi, static_cast<ViInt32>(names.size()), names.data()));
+        });
+    });
+    tiktal_close(vi);
+}
+
+// The same request as SessionGetTimeReferenceNames100k sends.
+void PlainLibcurlNames100k(benchmark::State& state) {
+    withManyReferences([&] { plainGets(state, {"sync_1?attribute=allTimeReferences"}); });
+}
+
 BENCHMARK(TransportGet)->UseRealTime();
 BENCHMARK(PlainLibcurlGet)->UseRealTime();
 BENCHMARK(SessionGetAttributeViInt32)->UseRealTime();
 BENCHMARK(PlainLibcurlTypeThenValue)->UseRealTime();
+BENCHMARK(SessionGetTimeReferenceNames100k)->UseRealTime()->Unit(benchmark::kMillisecond);
+BENCHMARK(PlainLibcurlNames100k)->UseRealTime()->Unit(benchmark::kMillisecond);
 
 }  // namespace
 
