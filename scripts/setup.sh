@@ -2,8 +2,9 @@
 # Installs the Debian packages the build and the tests need, when they are missing.
 set -euo pipefail
 
+# libclang-rt-dev: clang's sanitizer and libFuzzer runtimes, which Debian's clang only recommends.
 packages=(
-  cmake ninja-build g++ clang pkg-config python3 binutils
+  cmake ninja-build g++ clang libclang-rt-dev pkg-config python3 binutils
   libgtest-dev libgmock-dev libbenchmark-dev
   libcjson-dev libcurl4-openssl-dev libboost-dev libcpp-httplib-dev libcli11-dev
 )

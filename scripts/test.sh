@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # Builds the library and runs every test: a normal build, a build under AddressSanitizer and
-# UndefinedBehaviorSanitizer, and the concurrency tests under ThreadSanitizer.
+# UndefinedBehaviorSanitizer, the concurrency tests under ThreadSanitizer, and a short run of every
+# fuzz target on its seed corpus.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
@@ -26,3 +27,6 @@ ctest --test-dir build-asan --output-on-failure -j "$jobs"
 echo "== ThreadSanitizer (concurrency tests)"
 build build-tsan "${clang[@]}" -DTIKTAL_SANITIZE=thread
 TSAN_OPTIONS="halt_on_error=1" ctest --test-dir build-tsan -L concurrency --output-on-failure
+
+echo "== fuzz targets (20000 inputs each)"
+scripts/fuzz.sh --runs 20000
