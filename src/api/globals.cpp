@@ -17,31 +17,54 @@ GuardedMutex::~GuardedMutex() {
     if (_initialized) _mutex.destroy();
 }
 
-SessionDB::~SessionDB() { _sessions.clear(); }
+namespace {
+
+// The handle after `id`: the counter runs modulo 2^32 and leaves out 0.
+ViSession following(ViSession id) noexcept { return id + 1 == 0 ? 1 : id + 1; }
+
+}  // namespace
+
+// The shards, each built in place with its guarded lock: one per index of the sequence.
+template <std::size_t... Index>
+auto SessionDB::makeShards(nZRAPALS100::tStatus& initStatus, std::index_sequence<Index...>) noexcept
+    -> std::array<Shard, kShards> {
+    return {{(static_cast<void>(Index), Shard(initStatus))...}};
+}
+
+SessionDB::SessionDB(nZRAPALS100::tStatus& initStatus) noexcept
+    : _counterLock(initStatus, __LINE__), _shards(makeShards(initStatus, std::make_index_sequence<kShards>())) {}
 
 ViSession SessionDB::addSession(std::shared_ptr<Session> session) {
-    platform::LockGuard hold(_lock.get());
+    platform::LockGuard counting(_counterLock.get());
     // After 2^32 - 1 registrations the counter comes round again: skip handles still open.
-    while (_sessions.count(_nextId) != 0) _nextId = _nextId + 1 == 0 ? 1 : _nextId + 1;
-    const ViSession id = _nextId;
-    session->id = id;
-    _sessions.emplace(id, std::move(session));
-    _nextId = id + 1 == 0 ? 1 : id + 1;
-    return id;
+    for (;; _nextId = following(_nextId)) {
+        Shard& shard = shardOf(_nextId);
+        platform::LockGuard hold(shard.lock.get());
+        if (shard.sessions.count(_nextId) != 0) continue;
+        const ViSession id = _nextId;
+        session->id = id;
+        shard.sessions.emplace(id, std::move(session));
+        _nextId = following(id);
+        return id;
+    }
 }
 
 std::shared_ptr<Session> SessionDB::getSession(ViSession id) {
+    Shard& shard = shardOf(id);
     {
-        platform::LockGuard hold(_lock.get());
-        const auto found = _sessions.find(id);
-        if (found != _sessions.end()) return found->second;
+        platform::LockGuard hold(shard.lock.get());
+        const auto found = shard.sessions.find(id);
+        if (found != shard.sessions.end()) return found->second;
     }
     throw ZRERR_RAISE(tiktalerr_invalidObject).debug("msg", "SessionDB::getSession: id not found").debug("id", id);
 }
 
 void SessionDB::removeSession(ViSession id) {
-    platform::LockGuard hold(_lock.get());
-    _sessions.erase(id);
+    // Every shard, in order, so that the destructor of a session owned last by the registry runs
+    // before any other lookup, addition or removal.
+    for (Shard& shard : _shards) shard.lock.get().lock();
+    shardOf(id).sessions.erase(id);
+    for (auto shard = _shards.rbegin(); shard != _shards.rend(); ++shard) shard->lock.get().unlock();
 }
 
 namespace {

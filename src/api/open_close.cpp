@@ -15,6 +15,18 @@ void resetForOpen(Session& session) {
     }
 }
 
+// Shared ownership of `session` whose reference counts have their cache lines to themselves:
+// every call changes them, and beside the counts of another session they would make calls on
+// different sessions from different threads slow each other down.
+std::shared_ptr<Session> shareAlone(std::unique_ptr<Session> session) {
+    struct alignas(tiktal::kCacheLinePair) Owner {
+        std::unique_ptr<Session> session;
+    };
+    std::shared_ptr<Owner> owner = std::make_shared<Owner>(Owner{std::move(session)});
+    Session* const shared = owner->session.get();
+    return std::shared_ptr<Session>(std::move(owner), shared);
+}
+
 }  // namespace
 
 extern "C" {
@@ -25,7 +37,7 @@ ViStatus _VI_FUNC tiktal_init(ViRsrc resourceName, ViBoolean, ViBoolean reset, V
         *vi = 0;
         tiktal::checkGlobalInit();
         if (!resourceName) throw ZRERR_RAISE(tiktalerr_invParameter).debug("func", "tiktal_init");
-        std::shared_ptr<Session> session = tiktal::createSession(resourceName);
+        std::shared_ptr<Session> session = shareAlone(tiktal::createSession(resourceName));
         if (reset) resetForOpen(*session);
         *vi = tiktal::globals().sessionDB.addSession(std::move(session));
         return VI_SUCCESS;

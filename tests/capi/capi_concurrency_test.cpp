@@ -6,6 +6,7 @@
 // on its second line, inside the session operation, until the pipe is read.
 #include <sys/ioctl.h>
 
+#include <atomic>
 #include <chrono>
 #include <future>
 #include <mutex>
@@ -105,6 +106,88 @@ TEST(Concurrency, CloseDuringACallEndsTheSessionWhenTheCallReturns) {
                                          "} " + kTraced + "~SessionDebugPrintOnly"};
     EXPECT_EQ(trace, expected);
     EXPECT_EQ(tiktal_ConnectTrigTerminals(vi, "PXI_Trig0", "PFI0", nullptr, 0, 1), tiktalerr_invalidObject);
+}
+
+// A session that tiktal_close destroys is destroyed before a call on another thread, on any
+// handle, gets past the lookup of its handle: callers rely on the session being gone by then.
+TEST(Concurrency, LookupsWaitForTheDestructorOfAClosedSession) {
+    const ViSession probeSession = openTraceSession();
+    StderrCapture probe;
+    EXPECT_EQ(tiktal_close(probeSession), VI_SUCCESS);
+    const std::vector<std::string> probeWrites = probe.finish();
+    ASSERT_EQ(probeWrites.size(), 2u);
+
+    const ViSession closing = openTraceSession();
+    const std::vector<ViSession> others = {openTraceSession(), openTraceSession(), openTraceSession()};
+    std::vector<std::future<ViStatus>> lookups;  // self tests on `others` (not traced), then an unknown handle
+    ViStatus closeStatus = -1;
+    const std::vector<std::string> trace = whileBlockedInTrace(
+        probeWrites[0].size(), [&] { closeStatus = tiktal_close(closing); },
+        [&] {
+            for (const ViSession vi : others)
+                lookups.push_back(std::async(std::launch::async, [vi] {
+                    ViInt16 result = -1;
+                    char message[TIKTAL_ERROR_MESSAGE_SIZE];
+                    return tiktal_self_test(vi, &result, message);
+                }));
+            lookups.push_back(std::async(std::launch::async, [probeSession] { return tiktal_reset(probeSession); }));
+            std::this_thread::sleep_for(200ms);
+            for (const std::future<ViStatus>& lookup : lookups)
+                EXPECT_EQ(lookup.wait_for(0s), std::future_status::timeout) << "a call went ahead of the destructor";
+        });
+    EXPECT_EQ(closeStatus, VI_SUCCESS);
+    EXPECT_EQ(trace, (std::vector<std::string>{"{ " + kTraced + "~SessionDebugPrintOnly",
+                                               "} " + kTraced + "~SessionDebugPrintOnly"}));
+    ASSERT_EQ(lookups.size(), others.size() + 1);
+    for (std::size_t i = 0; i < others.size(); ++i) EXPECT_EQ(lookups[i].get(), VI_SUCCESS);
+    EXPECT_EQ(lookups.back().get(), tiktalerr_invalidObject);
+    for (const ViSession vi : others) closeQuietly(vi);
+}
+
+// Sessions kept open answer every call while other threads open, reset and close theirs.
+TEST(Concurrency, CallsOnOpenSessionsSucceedWhileOthersOpenAndClose) {
+    constexpr int kCallers = 4, kOpeners = 4, kRounds = 200;
+    QuietStderr quiet;  // the trace is long
+    std::vector<ViSession> kept(kCallers);
+    for (ViSession& vi : kept) ASSERT_EQ(tiktal_init(kTraceResource, VI_FALSE, VI_FALSE, &vi), VI_SUCCESS);
+    std::mutex mutex;
+    std::set<ViSession> issued(kept.begin(), kept.end());
+    std::atomic<int> openersLeft{kOpeners};
+    std::vector<std::thread> threads;
+    for (const ViSession vi : kept)
+        threads.emplace_back([&openersLeft, vi] {
+            do {  // at least once, then until the openers are done
+                ViInt16 result = -1;
+                char message[TIKTAL_ERROR_MESSAGE_SIZE];
+                ViUInt32 seconds, nanoseconds;
+                ViUInt16 fraction;
+                const ViStatus selfTest = tiktal_self_test(vi, &result, message);
+                const ViStatus time = tiktal_GetTime(vi, &seconds, &nanoseconds, &fraction);
+                if (selfTest != VI_SUCCESS || time != VI_SUCCESS) {
+                    ADD_FAILURE() << "a call on the open handle 0x" << std::hex << vi << " failed: 0x" << selfTest
+                                  << ", 0x" << time;
+                    return;
+                }
+            } while (openersLeft.load() > 0);
+        });
+    for (int opener = 0; opener < kOpeners; ++opener)
+        threads.emplace_back([&] {
+            for (int round = 0; round < kRounds; ++round) {
+                ViSession vi = 0;
+                EXPECT_EQ(tiktal_init(kTraceResource, VI_FALSE, VI_FALSE, &vi), VI_SUCCESS);
+                {
+                    const std::lock_guard<std::mutex> hold(mutex);
+                    EXPECT_TRUE(issued.insert(vi).second) << "handle 0x" << std::hex << vi << " issued twice";
+                }
+                EXPECT_EQ(tiktal_reset(vi), VI_SUCCESS);
+                EXPECT_EQ(tiktal_close(vi), VI_SUCCESS);
+                EXPECT_EQ(tiktal_reset(vi), tiktalerr_invalidObject);
+            }
+            --openersLeft;
+        });
+    for (std::thread& thread : threads) thread.join();
+    for (const ViSession vi : kept) EXPECT_EQ(tiktal_close(vi), VI_SUCCESS);
+    EXPECT_EQ(issued.size(), static_cast<std::size_t>(kCallers + kOpeners * kRounds));
 }
 
 TEST(Concurrency, ManyThreadsOpenCallAndCloseAtOnce) {
