@@ -24,22 +24,14 @@ ViSession following(ViSession id) noexcept { return id + 1 == 0 ? 1 : id + 1; }
 
 }  // namespace
 
-// The shards, each built in place with its guarded lock: one per index of the sequence.
-template <std::size_t... Index>
-auto SessionDB::makeShards(nZRAPALS100::tStatus& initStatus, std::index_sequence<Index...>) noexcept
-    -> std::array<Shard, kShards> {
-    return {{(static_cast<void>(Index), Shard(initStatus))...}};
-}
-
-SessionDB::SessionDB(nZRAPALS100::tStatus& initStatus) noexcept
-    : _counterLock(initStatus, __LINE__), _shards(makeShards(initStatus, std::make_index_sequence<kShards>())) {}
+SessionDB::SessionDB(nZRAPALS100::tStatus& initStatus) noexcept : _counterLock(initStatus, __LINE__) {}
 
 ViSession SessionDB::addSession(std::shared_ptr<Session> session) {
     platform::LockGuard counting(_counterLock.get());
     // After 2^32 - 1 registrations the counter comes round again: skip handles still open.
     for (;; _nextId = following(_nextId)) {
         Shard& shard = shardOf(_nextId);
-        platform::LockGuard hold(shard.lock.get());
+        const ShardGuard hold(shard.lock);
         if (shard.sessions.count(_nextId) != 0) continue;
         const ViSession id = _nextId;
         session->id = id;
@@ -52,7 +44,7 @@ ViSession SessionDB::addSession(std::shared_ptr<Session> session) {
 std::shared_ptr<Session> SessionDB::getSession(ViSession id) {
     Shard& shard = shardOf(id);
     {
-        platform::LockGuard hold(shard.lock.get());
+        const ShardGuard hold(shard.lock);
         const auto found = shard.sessions.find(id);
         if (found != shard.sessions.end()) return found->second;
     }
@@ -62,9 +54,9 @@ std::shared_ptr<Session> SessionDB::getSession(ViSession id) {
 void SessionDB::removeSession(ViSession id) {
     // Every shard, in order, so that the destructor of a session owned last by the registry runs
     // before any other lookup, addition or removal.
-    for (Shard& shard : _shards) shard.lock.get().lock();
+    for (Shard& shard : _shards) shard.lock.lock();
     shardOf(id).sessions.erase(id);
-    for (auto shard = _shards.rbegin(); shard != _shards.rend(); ++shard) shard->lock.get().unlock();
+    for (auto shard = _shards.rbegin(); shard != _shards.rend(); ++shard) shard->lock.unlock();
 }
 
 namespace {
