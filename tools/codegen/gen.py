@@ -4,7 +4,8 @@
 operations.tsv feeds the session base class, the call-tracing session and (with exports.tsv)
 the exported functions, the version script and the Windows module definition; statuses.tsv
 feeds the message table; attributes.tsv the time-service attribute dictionary; both attribute
-tables the list of attributes that the tiktal command knows by name."""
+tables the list of attributes that the tiktal command knows by name; roco_functions.tsv the C
+interface of the routing service and the library's table of its functions."""
 import argparse
 import os
 import re
@@ -271,6 +272,116 @@ const AttributeInfo kAttributes[] = {{
 }};
 """
 
+ROCO_FUNCTION_COUNT = 56
+
+
+def load_roco_functions(tables):
+    rows = read_tsv(os.path.join(tables, "roco_functions.tsv"))
+    functions = [dict(index=int(i), name=n, result=r, params=parse_params(p)) for i, n, r, p in rows]
+    if [f["index"] for f in functions] != list(range(ROCO_FUNCTION_COUNT)):
+        raise SystemExit(f"roco_functions.tsv: expected the rows 0 to {ROCO_FUNCTION_COUNT - 1} in order")
+    return functions
+
+
+def c_params(params):
+    return ", ".join(f"{t} {n}" for t, n in params) or "void"
+
+
+def gen_roco_header(functions):
+    typedefs = "\n".join(f"typedef {f['result']} (*zrrocoapi_{f['name']}_fn)({c_params(f['params'])});" for f in functions)
+    prototypes = "\n".join(f"ZRROCOAPI_EXPORT {f['result']} zrrocoapi_{f['name']}({c_params(f['params'])});"
+                           for f in functions)
+    return f"""/* Generated from src/tables/roco_functions.tsv: the C interface of the routing service. */
+#ifndef ZRROCOAPI_H
+#define ZRROCOAPI_H
+
+#include <stdint.h>
+
+#ifdef __cplusplus
+extern "C" {{
+#endif
+
+/* The status record of one call: the caller makes a fresh one with code 0 and no text; a failing
+   call sets a negative code (a warning a positive one) and writes a JSON object into the text,
+   after asking the caller's reallocate for room. */
+typedef struct zrrocoapi_Status zrrocoapi_Status;
+/* Makes room for `capacity` bytes of text, or frees the text when it is 0; nonzero on success.
+   A capacity above 0x7FFFFFFF fails. */
+typedef int32_t (*zrrocoapi_Reallocate)(zrrocoapi_Status* status, uint32_t capacity);
+struct zrrocoapi_Status {{
+    int32_t code;
+    uint32_t capacity;
+    zrrocoapi_Reallocate reallocate;
+    char* json;
+}};
+
+#ifndef ZRROCOAPI_EXPORT
+#define ZRROCOAPI_EXPORT
+#endif
+
+{typedefs}
+
+{prototypes}
+
+#ifdef __cplusplus
+}}
+#endif
+
+#endif
+"""
+
+
+def gen_roco_table(functions):
+    names = "\n".join(f'    "zrrocoapi_{f["name"]}",' for f in functions)
+    decls, calls = [], []
+    for f in functions:
+        args = ", ".join(n for _, n in f["params"])
+        fn = f"zrrocoapi_{f['name']}_fn"
+        params = c_params(f["params"])
+        decls.append(f"    virtual bool has_{f['name']}() const = 0;\n"
+                     f"    virtual {f['result']} {f['name']}({params}) = 0;")
+        calls.append(f"    bool has_{f['name']}() const override {{ return _functions[{f['index']}] != nullptr; }}\n"
+                     f"    {f['result']} {f['name']}({params}) override {{\n"
+                     f"        return reinterpret_cast<{fn}>(_functions[{f['index']}])({args});\n    }}")
+    return f"""// Generated from src/tables/roco_functions.tsv: the routing service's functions as the library
+// calls them, one pair of slots per function in table order.
+#pragma once
+
+#include <cstddef>
+
+#include "zrrocoapi.h"
+
+namespace zrrocoapi::dynlib {{
+
+inline constexpr std::size_t kFunctionCount = {len(functions)};
+
+// The export names, in table order.
+inline constexpr const char* kFunctionNames[kFunctionCount] = {{
+{names}
+}};
+
+// For each function: whether it is loaded, and the call itself.
+class RoCoLibInterface {{
+public:
+    virtual ~RoCoLibInterface() = default;
+{chr(10).join(decls)}
+}};
+
+// The loaded functions; all null until the loader fills them.
+class RoCoLib final : public RoCoLibInterface {{
+public:
+{chr(10).join(calls)}
+
+    // Where the loader puts function `index` of the table.
+    void*& function(std::size_t index) {{ return _functions[index]; }}
+
+private:
+    void* _functions[kFunctionCount] = {{}};
+}};
+
+}}  // namespace zrrocoapi::dynlib
+"""
+
 
 def main():
     parser = argparse.ArgumentParser(description=__doc__)
@@ -290,6 +401,9 @@ def main():
     files["statusTable.inc"] = gen_status_table(statuses)
     files["HorloApiAttrDict.inc"] = gen_attribute_dictionary(args.tables)
     files["commandAttributes.inc"] = gen_command_attributes(args.tables)
+    roco = load_roco_functions(args.tables)
+    files["zrrocoapi.h"] = gen_roco_header(roco)
+    files["RoCoLib.h"] = gen_roco_table(roco)
     for name, text in files.items():
         path = os.path.join(args.out, name)
         old = open(path, encoding="utf-8").read() if os.path.exists(path) else None
