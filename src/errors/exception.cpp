@@ -196,6 +196,15 @@ void ExceptionBase::addDetail(const char* key, const ExceptionBase& other, bool 
     }
 }
 
+bool ExceptionBase::adoptDetailText(const char* jsonObject) noexcept {
+    const std::size_t size = std::strlen(jsonObject) + 1;
+    if (!_accepting || !_text || size > kMaximumCapacity || (size > _capacity && !_grow(*this, static_cast<std::uint32_t>(size))))
+        return false;
+    std::memcpy(_text, jsonObject, size);
+    _debugOpen = false;
+    return true;
+}
+
 Exception raise(std::int32_t code, const char* constant, const char* file, int line, const char* debugTag) noexcept {
     Exception e;
     e.setDebugTag(debugTag);

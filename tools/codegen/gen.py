@@ -370,6 +370,9 @@ public:
 // The loaded functions; all null until the loader fills them.
 class RoCoLib final : public RoCoLibInterface {{
 public:
+    static constexpr std::size_t kCount = kFunctionCount;
+    static const char* name(std::size_t index) {{ return kFunctionNames[index]; }}
+
 {chr(10).join(calls)}
 
     // Where the loader puts function `index` of the table.
