@@ -7,19 +7,16 @@ namespace tiktal::roco {
 using zrrocoapi::call;
 
 ImmediateSession::ImmediateSession(RoCoLibInterface& lib)
-    : _lib(lib), _handle(call([&](zrrocoapi_Status* st) { return lib.createImmediateSession(st); })) {}
-
-ImmediateSession::~ImmediateSession() { _lib.destroySession(_handle); }
+    : ServiceHandle(lib, call([&](zrrocoapi_Status* st) { return lib.createImmediateSession(st); }),
+                    &RoCoLibInterface::destroySession) {}
 
 Session::Session(RoCoLibInterface& lib)
-    : _lib(lib), _handle(call([&](zrrocoapi_Status* st) { return lib.createSession(st); })) {}
-
-Session::~Session() { _lib.destroySession(_handle); }
+    : ServiceHandle(lib, call([&](zrrocoapi_Status* st) { return lib.createSession(st); }),
+                    &RoCoLibInterface::destroySession) {}
 
 RouteAttributes::RouteAttributes(RoCoLibInterface& lib)
-    : _lib(lib), _handle(call([&](zrrocoapi_Status* st) { return lib.RouteAttributes_new(st); })) {}
-
-RouteAttributes::~RouteAttributes() { _lib.RouteAttributes_destroy(_handle); }
+    : ServiceHandle(lib, call([&](zrrocoapi_Status* st) { return lib.RouteAttributes_new(st); }),
+                    &RoCoLibInterface::RouteAttributes_destroy) {}
 
 void resetDevice(RoCoLibInterface& lib, const std::string& alias, const std::function<void()>& resetHardware) {
     const Session session(lib);

@@ -11,50 +11,43 @@ namespace tiktal::roco {
 
 using zrrocoapi::dynlib::RoCoLibInterface;
 
-// A session whose routes take effect as soon as they are calculated.
-class ImmediateSession {
+// One handle of the routing service, ended by the service function `destroy` when it goes.
+class ServiceHandle {
 public:
-    explicit ImmediateSession(RoCoLibInterface& lib);
-    ~ImmediateSession();
-    ImmediateSession(const ImmediateSession&) = delete;
-    ImmediateSession& operator=(const ImmediateSession&) = delete;
+    ServiceHandle(const ServiceHandle&) = delete;
+    ServiceHandle& operator=(const ServiceHandle&) = delete;
 
     RoCoLibInterface& lib() const noexcept { return _lib; }
     std::uint32_t handle() const noexcept { return _handle; }
 
+protected:
+    using Destroy = void (RoCoLibInterface::*)(std::uint32_t);
+    ServiceHandle(RoCoLibInterface& lib, std::uint32_t handle, Destroy destroy) noexcept
+        : _lib(lib), _handle(handle), _destroy(destroy) {}
+    ~ServiceHandle() { (_lib.*_destroy)(_handle); }
+
 private:
     RoCoLibInterface& _lib;
     std::uint32_t _handle;
+    Destroy _destroy;
+};
+
+// A session whose routes take effect as soon as they are calculated.
+class ImmediateSession : public ServiceHandle {
+public:
+    explicit ImmediateSession(RoCoLibInterface& lib);
 };
 
 // A session for one device reset.
-class Session {
+class Session : public ServiceHandle {
 public:
     explicit Session(RoCoLibInterface& lib);
-    ~Session();
-    Session(const Session&) = delete;
-    Session& operator=(const Session&) = delete;
-
-    std::uint32_t handle() const noexcept { return _handle; }
-
-private:
-    RoCoLibInterface& _lib;
-    std::uint32_t _handle;
 };
 
 // Attributes of one route calculation.
-class RouteAttributes {
+class RouteAttributes : public ServiceHandle {
 public:
     explicit RouteAttributes(RoCoLibInterface& lib);
-    ~RouteAttributes();
-    RouteAttributes(const RouteAttributes&) = delete;
-    RouteAttributes& operator=(const RouteAttributes&) = delete;
-
-    std::uint32_t handle() const noexcept { return _handle; }
-
-private:
-    RoCoLibInterface& _lib;
-    std::uint32_t _handle;
 };
 
 // Resets the device `alias`: the service is told that the reset begins, `resetDevice` resets the
