@@ -5,7 +5,8 @@ operations.tsv feeds the session base class, the call-tracing session and (with 
 the exported functions, the version script and the Windows module definition; statuses.tsv
 feeds the message table; attributes.tsv the time-service attribute dictionary; both attribute
 tables the list of attributes that the tiktal command knows by name; roco_functions.tsv the C
-interface of the routing service and the library's table of its functions."""
+interface of the routing service and the library's table of its functions; device_requests.tsv the
+timing module's driver requests, for the library's proxy and for the device daemon."""
 import argparse
 import os
 import re
@@ -386,6 +387,189 @@ private:
 """
 
 
+FIELD_BYTES = {"u32": 4, "u64": 8, "i32": 4}
+
+
+def parse_fields(text):
+    """'a:u32,pad,st' -> [('a', 'u32'), ('pad', None), ('st', 'i32')]."""
+    fields = []
+    for field in text.split(","):
+        if field == "st":
+            fields.append(("st", "i32"))
+        elif field == "pad":
+            fields.append(("pad", None))
+        else:
+            name, kind = field.split(":")
+            fields.append((name, kind))
+    return fields
+
+
+def packet_size(fields):
+    return sum(FIELD_BYTES.get(kind, 4) for _, kind in fields)
+
+
+def load_device_requests(tables):
+    requests = []
+    for interface, slot, name, code, params, inputs, outputs, result in read_tsv(os.path.join(tables, "device_requests.tsv")):
+        requests.append(dict(interface=interface, slot=int(slot), name=name, code=code,
+                             params=[] if params == "-" else params.split(","),
+                             input=parse_fields(inputs), output=parse_fields(outputs), result=result.split(";")))
+    for interface, count in (("tiktal", 9), ("routing", 11)):
+        slots = [r["slot"] for r in requests if r["interface"] == interface]
+        if slots != list(range(count)):
+            raise SystemExit(f"device_requests.tsv: {interface} needs the slots 0 to {count - 1} in order")
+    return requests
+
+
+def gen_device_request_table(requests):
+    rows = "\n".join(f'    {{"{r["name"]}", {r["code"]}u, {packet_size(r["input"])}, {packet_size(r["output"])}}},'
+                      for r in requests)
+    return f"""// Generated from src/tables/device_requests.tsv: the timing module's driver requests, their
+// control codes and packet sizes in bytes.
+#pragma once
+
+#include <cstdint>
+
+namespace tiktalq300::requests {{
+
+struct Request {{
+    const char* name;
+    std::uint32_t code;
+    std::uint32_t inputSize;
+    std::uint32_t outputSize;
+}};
+
+inline constexpr Request kRequests[] = {{
+{rows}
+}};
+
+// A driver wait, and its cancel (packets of 24 and 8 bytes, no output).
+inline constexpr std::uint32_t kWaitCode = 0x0022FC00u;
+inline constexpr std::uint32_t kCancelWaitCode = 0x0022FC04u;
+inline constexpr std::uint32_t kWaitInputSize = 24;
+inline constexpr std::uint32_t kCancelWaitInputSize = 8;
+
+}}  // namespace tiktalq300::requests
+"""
+
+
+def request_params(r):
+    params = [f"std::uint32_t* {p[1:]}" if p.startswith("*") else f"std::uint32_t {p}" for p in r["params"]]
+    return ", ".join(params + ["nZRAPALS100::tStatus& status"])
+
+
+def request_return(r):
+    returned = [x for x in r["result"] if x != "-" and "=" not in x]
+    if not returned:
+        return "void"
+    return "std::uint16_t" if returned[0].endswith(":u16") else "std::uint32_t"
+
+
+def request_body(r):
+    void = request_return(r) == "void"
+    fail = "return;" if void else "return 0;"
+    lines = [f"    if (status.isError()) {fail}"]
+    pointers = {p[1:] for p in r["params"] if p.startswith("*")}
+    for pointer in sorted(pointers):
+        lines.append(f"    if (!{pointer}) {{\n        mergeNullArgument(status, __LINE__);\n        {fail}\n    }}")
+    lines.append(f"    PacketWriter in({packet_size(r['input'])});")
+    for name, kind in r["input"]:
+        if name == "pad":
+            lines.append("    in.pad();")
+        elif name == "st":
+            lines.append("    in.i32(status.code);")
+        else:
+            value = f"*{name}" if name in pointers else name
+            lines.append(f"    in.{kind}({value});")
+    out_size = packet_size(r["output"])
+    lines.append(f"    std::uint8_t out[{out_size}] = {{}};")
+    lines.append(f"    if (!request({r['code']}u, in, out, sizeof out, status)) {fail}")
+    lines.append("    PacketReader reader(out);")
+    for name, kind in r["output"]:
+        if name == "st":
+            lines.append("    mergeDriverStatus(reader.i32(), status, __LINE__);")
+        else:
+            lines.append(f"    const std::uint32_t {name}Out = reader.u32();")
+    for result in r["result"]:
+        if "=" in result:
+            target, field = result.split("=")
+            lines.append(f"    *{target} = {field}Out;")
+    returned = [x for x in r["result"] if x != "-" and "=" not in x]
+    if returned:
+        field = returned[0].split(":")[0]
+        cast = "static_cast<std::uint16_t>" if returned[0].endswith(":u16") else ""
+        lines.append(f"    return {cast}({field}Out);")
+    return "\n".join(lines)
+
+
+def gen_device_proxy(requests):
+    def decls(interface, pure):
+        suffix = " = 0;" if pure else " override;"
+        return "\n".join(f"    virtual {request_return(r)} {r['name']}({request_params(r)}){suffix}"
+                         for r in requests if r["interface"] == interface)
+    header = f"""// Generated from src/tables/device_requests.tsv: the timing module's driver requests as
+// interfaces, and the proxy that sends them.
+#pragma once
+
+#include <cstdint>
+
+#include "timing/interface_proxy.h"
+
+namespace tiktalq300 {{
+
+class iInterfaceProxy_tiktal : public virtual tiktal::nZRAPAL000::iInterfaceProxy {{
+public:
+{decls("tiktal", True)}
+}};
+
+}}  // namespace tiktalq300
+
+namespace tiktal {{
+
+class iInterfaceProxy_routing : public virtual nZRAPAL000::iInterfaceProxy {{
+public:
+{decls("routing", True)}
+}};
+
+}}  // namespace tiktal
+
+namespace tiktalq300 {{
+
+class tInterfaceProxy_tiktal final : public tiktal::nZRAPAL000::tDeviceInterfaceProxy,
+                                     public iInterfaceProxy_tiktal,
+                                     public tiktal::iInterfaceProxy_routing {{
+public:
+    tInterfaceProxy_tiktal() = default;
+    ~tInterfaceProxy_tiktal() override;
+
+{decls("tiktal", False)}
+{decls("routing", False)}
+}};
+
+}}  // namespace tiktalq300
+"""
+    bodies = "\n\n".join(f"{request_return(r)} tInterfaceProxy_tiktal::{r['name']}({request_params(r)}) {{\n"
+                          f"{request_body(r)}\n}}" for r in requests)
+    source = f"""// Generated from src/tables/device_requests.tsv: each request builds its input packet field by
+// field, sends it, and reads the driver's answer and status from the output packet.
+#include "InterfaceProxyTiktal.h"
+
+#include "timing/packet.h"
+
+namespace tiktalq300 {{
+
+using tiktal::nZRAPAL000::PacketReader;
+using tiktal::nZRAPAL000::PacketWriter;
+
+tInterfaceProxy_tiktal::~tInterfaceProxy_tiktal() {{ close(); }}
+
+{bodies}
+
+}}  // namespace tiktalq300
+"""
+    return header, source
+
+
 def main():
     parser = argparse.ArgumentParser(description=__doc__)
     parser.add_argument("--tables", required=True)
@@ -407,6 +591,9 @@ def main():
     roco = load_roco_functions(args.tables)
     files["zrrocoapi.h"] = gen_roco_header(roco)
     files["RoCoLib.h"] = gen_roco_table(roco)
+    device_requests = load_device_requests(args.tables)
+    files["deviceRequests.h"] = gen_device_request_table(device_requests)
+    files["InterfaceProxyTiktal.h"], files["InterfaceProxyTiktal.cpp"] = gen_device_proxy(device_requests)
     for name, text in files.items():
         path = os.path.join(args.out, name)
         old = open(path, encoding="utf-8").read() if os.path.exists(path) else None
