@@ -22,4 +22,15 @@ void tStatus::merge(std::int32_t newCode, const char* newComponent, const char* 
     line = newLine;
 }
 
+void tStatus::merge(const tStatus& other) noexcept {
+    const bool take = (code == 0 && other.code != 0) || (code > 0 && other.code < 0);
+    if (!take) return;
+    if (other.size < sizeof(tStatus)) {
+        code = other.code;
+        return;
+    }
+    merge(other.code, other.component, other.file, other.line);
+    if (size >= sizeof(tStatus)) std::memcpy(extension, other.extension, sizeof extension);
+}
+
 }  // namespace nZRAPALS100

@@ -17,6 +17,9 @@ struct tStatus {
     // Takes `newCode` by the rule of every status: a first error is never replaced and a
     // warning gives way to an error. Component and file are cut to fit.
     void merge(std::int32_t newCode, const char* newComponent, const char* newFile, std::uint32_t newLine) noexcept;
+    // The same rule for a whole record: where it was set comes along, and its extension words too
+    // when both records are full size.
+    void merge(const tStatus& other) noexcept;
 };
 
 static_assert(sizeof(tStatus) == 164, "the status record is 164 bytes");

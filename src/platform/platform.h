@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <memory>
 #include <string>
 
 namespace platform {
@@ -52,5 +53,54 @@ std::string libraryFileName(const std::string& stem);
 // The shared installation directory that holds the run-time libraries: $ZRSHAREDDIR when set,
 // else the directory chosen when the library was configured.
 std::string sharedDirectory();
+
+// The platform status of an operating-system error number (0 for 0).
+std::int32_t statusOfOsError(int error) noexcept;
+
+// A connection to a device's driver at its interface path. On Linux the driver is a daemon on a
+// Unix seqpacket socket: a request is one message (u32 control code, u32 output room, the input
+// packet), its answer one message (i32 error number, u32 bytes returned, the output bytes).
+class DeviceChannel {
+public:
+    DeviceChannel();
+    ~DeviceChannel();
+    DeviceChannel(const DeviceChannel&) = delete;
+    DeviceChannel& operator=(const DeviceChannel&) = delete;
+
+    // 0, or the error number of the failure.
+    int open(const std::string& path) noexcept;
+    void close() noexcept;
+    bool isOpen() const noexcept;
+    const std::string& path() const noexcept;
+    // One request and its answer; requests of several threads each get their own answer. 0, or
+    // the error number the driver answered or the transport met; `returned` is the output size.
+    int control(std::uint32_t code, const void* in, std::uint32_t inSize, void* out, std::uint32_t outSize,
+                std::uint32_t& returned) noexcept;
+
+private:
+    struct State;
+    std::unique_ptr<State> _state;
+};
+
+// One driver wait, on a connection of its own: armed by one request whose first answer carries
+// the wait identifier; the second answer comes when the condition occurs or the wait is cancelled.
+class DeviceWait {
+public:
+    DeviceWait() noexcept = default;
+    ~DeviceWait();
+    DeviceWait(const DeviceWait&) = delete;
+    DeviceWait& operator=(const DeviceWait&) = delete;
+
+    // Sends the wait request; 0 with the identifier (0: not armed), or the error number.
+    int arm(const std::string& path, std::uint32_t code, const void* in, std::uint32_t inSize,
+            std::uint64_t& identifier) noexcept;
+    // Blocks until the wait ends; 0, or the error number (the connection lost among them).
+    int awaitEnd() noexcept;
+    // Ends a blocked awaitEnd at once (its connection is shut).
+    void abandon() noexcept;
+
+private:
+    int _socket = -1;
+};
 
 }  // namespace platform

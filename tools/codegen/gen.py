@@ -471,7 +471,7 @@ def request_body(r):
     lines = [f"    if (status.isError()) {fail}"]
     pointers = {p[1:] for p in r["params"] if p.startswith("*")}
     for pointer in sorted(pointers):
-        lines.append(f"    if (!{pointer}) {{\n        mergeNullArgument(status, __LINE__);\n        {fail}\n    }}")
+        lines.append(f"    if (!{pointer}) {{\n        mergeNullArgument(status, __FILE__, __LINE__);\n        {fail}\n    }}")
     lines.append(f"    PacketWriter in({packet_size(r['input'])});")
     for name, kind in r["input"]:
         if name == "pad":
@@ -487,7 +487,7 @@ def request_body(r):
     lines.append("    PacketReader reader(out);")
     for name, kind in r["output"]:
         if name == "st":
-            lines.append("    mergeDriverStatus(reader.i32(), status, __LINE__);")
+            lines.append("    mergeDriverStatus(reader.i32(), status, __FILE__, __LINE__);")
         else:
             lines.append(f"    const std::uint32_t {name}Out = reader.u32();")
     for result in r["result"]:
