@@ -1,6 +1,7 @@
 // The record of the request messages received, in the order they arrived, for tests to read back.
-// Every message with a whole header is recorded, refused ones included; the record keeps the
-// latest kRecordLimit of them.
+// Every message with a whole header is recorded, refused ones included, once the directives for
+// it are taken (so a request that a test sees in the record has had its directives); the record
+// keeps the latest kRecordLimit of them.
 #pragma once
 
 #include "wire.h"

@@ -82,11 +82,13 @@ bool answerTable(Daemon& daemon, int fd, const Request& request, std::int32_t dr
 bool handle(Daemon& daemon, int fd, const Bytes& message) {
     Decoded decoded = decode(message.data(), message.size());
     const Request& request = decoded.request;
+    // Recorded after its directives are taken: a test that sees the request in the record knows
+    // that the directives it set went to this one.
+    const Action action = decoded.refusal == 0 ? daemon.directives.take(request.code) : Action{};
     if (decoded.hasHeader)
         daemon.record.add({request.code, request.outputSize, Bytes(message.begin() + kHeaderSize, message.end())});
     if (decoded.refusal != 0) return send(fd, decoded.refusal);
 
-    const Action action = daemon.directives.take(request.code);
     if (action.close) return false;
     if (action.delayMs > 0 && !daemon.lifetime.sleepFor(action.delayMs)) return false;
     if (action.osError != 0) return send(fd, action.osError);
