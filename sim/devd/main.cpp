@@ -9,6 +9,7 @@
 // every connection ends, and it exits with status 0. README.md describes the rest.
 #include "connections.h"
 #include "daemon.h"
+#include "stop_signals.h"
 
 #include <poll.h>
 #include <signal.h>
@@ -19,9 +20,12 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstdio>
 #include <cstring>
+#include <map>
 #include <string>
+#include <thread>
 
 namespace {
 
@@ -30,18 +34,17 @@ struct Arguments {
     std::string control;
 };
 
+// Reads the options, each at most once; false after printing the usage.
 bool readArguments(int argc, char** argv, Arguments& arguments) {
-    bool usage = argc != 3 && argc != 5;
-    for (int i = 1; !usage && i + 1 < argc; i += 2) {
-        const std::string option = argv[i];
-        if (option == "--socket")
-            arguments.socket = argv[i + 1];
-        else if (option == "--control")
-            arguments.control = argv[i + 1];
-        else
-            usage = true;
+    const std::map<std::string, std::string*> options = {{"--socket", &arguments.socket},
+                                                         {"--control", &arguments.control}};
+    bool usable = argc % 2 == 1;
+    for (int i = 1; usable && i < argc; i += 2) {
+        const auto option = options.find(argv[i]);
+        usable = option != options.end() && option->second->empty() && argv[i + 1][0] != '\0';
+        if (usable) *option->second = argv[i + 1];
     }
-    if (usage || arguments.socket.empty()) {
+    if (!usable || arguments.socket.empty()) {
         std::fprintf(stderr, "usage: tiktal_devd --socket PATH [--control PATH]\n");
         return false;
     }
@@ -69,18 +72,6 @@ int listenOn(const std::string& path, int type) {
     return -1;
 }
 
-// SIGTERM and SIGINT arrive on the returned descriptor only: they are blocked in every thread
-// (threads inherit the mask). A peer that goes away must not end the program.
-int stopSignals() {
-    sigset_t signals;
-    sigemptyset(&signals);
-    sigaddset(&signals, SIGTERM);
-    sigaddset(&signals, SIGINT);
-    pthread_sigmask(SIG_BLOCK, &signals, nullptr);
-    signal(SIGPIPE, SIG_IGN);
-    return signalfd(-1, &signals, SFD_CLOEXEC);
-}
-
 // Accepts connections on both sockets until a stop signal arrives.
 void acceptUntilStopped(devd::Daemon& daemon, devd::Connections& connections, int stopFd, int deviceFd, int controlFd) {
     for (;;) {
@@ -93,7 +84,9 @@ void acceptUntilStopped(devd::Daemon& daemon, devd::Connections& connections, in
         for (int i = 1; i < 3; ++i) {
             if (watched[i].revents == 0) continue;
             const int fd = accept4(watched[i].fd, nullptr, nullptr, SOCK_CLOEXEC);
-            if (fd < 0) continue;  // the peer gave up already, or descriptors ran out for now
+            if (fd < 0 && (errno == EMFILE || errno == ENFILE))  // out of descriptors: let connections end
+                std::this_thread::sleep_for(std::chrono::milliseconds(10));
+            if (fd < 0) continue;  // or the peer gave up already
             if (i == 1)
                 connections.start(fd, [&daemon](int connection) { devd::serveDevice(daemon, connection); });
             else
@@ -107,7 +100,9 @@ void acceptUntilStopped(devd::Daemon& daemon, devd::Connections& connections, in
 int main(int argc, char** argv) {
     Arguments arguments;
     if (!readArguments(argc, argv, arguments)) return 2;
-    const int stopFd = stopSignals();
+    // The stop signals arrive on this descriptor only: every thread has them blocked.
+    const sigset_t signals = simcommon::blockStopSignals();
+    const int stopFd = signalfd(-1, &signals, SFD_CLOEXEC);
     if (stopFd < 0) {
         std::fprintf(stderr, "tiktal_devd: signalfd: %s\n", std::strerror(errno));
         return 1;
