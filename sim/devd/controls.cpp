@@ -47,14 +47,13 @@ std::string hex(const Bytes& bytes) {
     return text;
 }
 
-void addNumber(cJSON* object, const char* name, double value) { cJSON_AddItemToObject(object, name, cJSON_CreateNumber(value)); }
 
 Json packets(Daemon& daemon) {
     Json list(cJSON_CreateArray());
     for (const RecordedPacket& packet : daemon.record.all()) {
         cJSON* item = cJSON_CreateObject();
-        addNumber(item, "code", packet.code);
-        addNumber(item, "outputSize", packet.outputSize);
+        cJSON_AddNumberToObject(item, "code", packet.code);
+        cJSON_AddNumberToObject(item, "outputSize", packet.outputSize);
         cJSON_AddItemToObject(item, "input", cJSON_CreateString(hex(packet.input).c_str()));
         cJSON_AddItemToArray(list.get(), item);
     }
@@ -65,10 +64,10 @@ Json armedWaits(Daemon& daemon) {
     Json list(cJSON_CreateArray());
     for (const auto& wait : daemon.waits.armed()) {
         cJSON* item = cJSON_CreateObject();
-        addNumber(item, "id", static_cast<double>(wait->id()));
-        addNumber(item, "arg1", wait->arg1());
-        addNumber(item, "arg2", wait->arg2());
-        addNumber(item, "arg3", wait->arg3());
+        cJSON_AddNumberToObject(item, "id", static_cast<double>(wait->id()));
+        cJSON_AddNumberToObject(item, "arg1", wait->arg1());
+        cJSON_AddNumberToObject(item, "arg2", wait->arg2());
+        cJSON_AddNumberToObject(item, "arg3", wait->arg3());
         cJSON_AddItemToArray(list.get(), item);
     }
     return list;
@@ -78,8 +77,8 @@ Json terminalValues(Daemon& daemon) {
     Json list(cJSON_CreateArray());
     for (const auto& [terminal, value] : daemon.device.terminalValues()) {
         cJSON* item = cJSON_CreateObject();
-        addNumber(item, "terminal", terminal);
-        addNumber(item, "value", value);
+        cJSON_AddNumberToObject(item, "terminal", terminal);
+        cJSON_AddNumberToObject(item, "value", value);
         cJSON_AddItemToArray(list.get(), item);
     }
     return list;
