@@ -10,6 +10,7 @@
 #include "connections.h"
 #include "controls.h"
 #include "simulator.h"
+#include "stop_signals.h"
 
 #include <arpa/inet.h>
 #include <httplib.h>
@@ -87,18 +88,6 @@ bool readArguments(int argc, char** argv, Arguments& arguments) {
     return false;
 }
 
-// Signals are taken by one thread with sigwait; every other thread, the server's included, has
-// them blocked. A peer that goes away must not end the program.
-sigset_t blockStopSignals() {
-    sigset_t signals;
-    sigemptyset(&signals);
-    sigaddset(&signals, SIGTERM);
-    sigaddset(&signals, SIGINT);
-    pthread_sigmask(SIG_BLOCK, &signals, nullptr);
-    signal(SIGPIPE, SIG_IGN);
-    return signals;
-}
-
 void configure(httplib::Server& server, Simulator& sim) {
     server.new_task_queue = [] { return new timeservice::ConnectionThreads; };
     server.set_tcp_nodelay(true);  // answers go out at once, not after the peer's delayed ACK
@@ -152,7 +141,7 @@ int main(int argc, char** argv) {
         std::fprintf(stderr, "timeservice_sim: %s\n", e.what());
         return 2;
     }
-    const sigset_t signals = blockStopSignals();
+    const sigset_t signals = simcommon::blockStopSignals();  // the server's threads too
 
     Simulator sim(arguments.statePath, std::move(state));
     httplib::Server server;

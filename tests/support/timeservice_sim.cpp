@@ -1,47 +1,23 @@
 #include "timeservice_sim.h"
 
+#include "child_process.h"
+
 #include <cjson/cJSON.h>
 #include <curl/curl.h>
-#include <fcntl.h>
-#include <poll.h>
 #include <signal.h>
-#include <sys/prctl.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
-#include <cerrno>
 #include <chrono>
-#include <cstdlib>
 #include <cstring>
-#include <filesystem>
 #include <memory>
 #include <mutex>
 #include <stdexcept>
-#include <thread>
-#include <vector>
 
 namespace {
 
-using Clock = std::chrono::steady_clock;
-constexpr auto kStartLimit = std::chrono::seconds(10);
-constexpr auto kStopLimit = std::chrono::seconds(10);
+constexpr std::chrono::milliseconds kStartLimit(10000);
+constexpr std::chrono::milliseconds kStopLimit(10000);
 
 std::runtime_error failure(const std::string& what) { return std::runtime_error("TimeServiceSim: " + what); }
-
-std::string errnoText(const char* call) { return std::string(call) + ": " + std::strerror(errno); }
-
-// Waits up to `limit` for the child to end; -1 when it has not.
-int waitForExit(pid_t pid, Clock::duration limit) {
-    const auto deadline = Clock::now() + limit;
-    for (;;) {
-        int status = 0;
-        const pid_t done = waitpid(pid, &status, WNOHANG);
-        if (done == pid) return WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
-        if (done < 0 && errno != EINTR) return 128 + SIGKILL;  // not our child any more
-        if (Clock::now() >= deadline) return -1;
-        std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-}
 
 size_t appendBody(char* data, size_t size, size_t count, void* target) {
     static_cast<std::string*>(target)->append(data, size * count);
@@ -65,69 +41,21 @@ TimeServiceSim::TimeServiceSim(Options options) : _program(std::move(options.pro
 #endif
     if (_program.empty()) throw failure("no program given");
     if (_statePath.empty()) {
-        char folder[] = "/tmp/timeservice_sim.XXXXXX";
-        if (!mkdtemp(folder)) throw failure(errnoText("mkdtemp"));
-        _temporaryFolder = folder;
+        _temporaryFolder = tiktaltest::makeTemporaryFolder("timeservice_sim");
         _statePath = _temporaryFolder + "/state.json";
     }
     const std::string& address = options.address;
     const std::string listen = (address.find(':') == std::string::npos ? address : "[" + address + "]") + ":0";
 
-    // Everything the child needs is prepared before fork: after it, the child only calls exec.
-    std::vector<std::string> arguments = {_program, "--listen", listen, "--state", _statePath};
-    std::vector<char*> argv;
-    for (std::string& argument : arguments) argv.push_back(argument.data());
-    argv.push_back(nullptr);
-    int output[2];
-    if (pipe2(output, O_CLOEXEC) != 0) {
-        const std::string what = errnoText("pipe2");
-        removeTemporaryFolder();
-        throw failure(what);
-    }
-    const pid_t parent = getpid();
-    _pid = fork();
-    if (_pid == 0) {
-        prctl(PR_SET_PDEATHSIG, SIGTERM);
-        if (getppid() != parent) _exit(126);
-        dup2(output[1], STDOUT_FILENO);
-        execv(argv[0], argv.data());
-        _exit(127);
-    }
-    close(output[1]);
-    if (_pid < 0) {
-        const std::string what = errnoText("fork");
-        close(output[0]);
-        removeTemporaryFolder();
-        throw failure(what);
-    }
-
-    // Readiness is the first line on the child's standard output.
-    std::string text, problem;
-    const auto deadline = Clock::now() + kStartLimit;
-    while (problem.empty() && text.find('\n') == std::string::npos) {
-        const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(deadline - Clock::now()).count();
-        pollfd ready{output[0], POLLIN, 0};
-        const int polled = left > 0 ? poll(&ready, 1, static_cast<int>(left)) : 0;
-        if (polled < 0 && errno == EINTR) continue;
-        if (polled == 0) problem = "no \"listening on\" line within 10 s";
-        if (polled < 0) problem = errnoText("poll");
-        if (!problem.empty()) break;
-        char buffer[256];
-        const ssize_t got = read(output[0], buffer, sizeof buffer);
-        if (got < 0 && errno == EINTR) continue;
-        if (got <= 0) problem = _program + " ended before it listened";
-        else text.append(buffer, static_cast<size_t>(got));
-    }
-    close(output[0]);
-    const std::string line = text.substr(0, text.find('\n'));
-    const std::string prefix = "listening on ";
-    if (problem.empty() && line.compare(0, prefix.size(), prefix) != 0) problem = "unexpected output: " + line;
-    if (!problem.empty()) {
+    const tiktaltest::StartedChild child =
+        tiktaltest::startChild({_program, "--listen", listen, "--state", _statePath}, "listening on ", kStartLimit);
+    _pid = child.pid;
+    if (!child.problem.empty()) {
         const int status = stop();
         removeTemporaryFolder();
-        throw failure(problem + " (exit status " + std::to_string(status) + ")");
+        throw failure(child.problem + " (exit status " + std::to_string(status) + ")");
     }
-    _host = line.substr(prefix.size());
+    _host = child.ready;
 }
 
 TimeServiceSim::~TimeServiceSim() {
@@ -136,22 +64,13 @@ TimeServiceSim::~TimeServiceSim() {
 }
 
 int TimeServiceSim::stop() {
-    if (_pid > 0) {
-        kill(_pid, SIGTERM);
-        _exitStatus = waitForExit(_pid, kStopLimit);
-        if (_exitStatus < 0) {  // it did not stop: a fault of the simulator that the caller sees
-            kill(_pid, SIGKILL);
-            _exitStatus = waitForExit(_pid, kStopLimit);
-        }
-        _pid = -1;
-    }
+    if (_pid > 0) _exitStatus = tiktaltest::stopChild(_pid, SIGTERM, kStopLimit);
+    _pid = -1;
     return _exitStatus;
 }
 
 void TimeServiceSim::removeTemporaryFolder() noexcept {
-    if (_temporaryFolder.empty()) return;
-    std::error_code ignored;
-    std::filesystem::remove_all(_temporaryFolder, ignored);
+    tiktaltest::removeFolder(_temporaryFolder);
     _temporaryFolder.clear();
 }
 
