@@ -78,19 +78,22 @@ TEST_F(Proxy, EveryRequestSendsItsPacketByteForByte) {
     EXPECT_EQ(status.code, 0);
 
     const std::uint32_t infoCodes[] = {0x807F2004u, 0x807F2008u, 0x807F200Cu, 0x807F2010u, 0x807F2014u, 0x807F2018u};
-    proxy().readInfo1(status);
+    // The daemon's model data: revision, variant and device id, firmware, image date, terminals,
+    // temperature.
+    EXPECT_EQ(proxy().readInfo1(status), 3u);
     EXPECT_EQ(last().code, infoCodes[0]);
-    proxy().readInfo2(status);
+    EXPECT_EQ(proxy().readInfo2(status), 0x7405u);
     EXPECT_EQ(last().code, infoCodes[1]);
-    proxy().readInfo3(status);
-    proxy().readInfo4(status);
-    proxy().readInfo5(status);
-    proxy().readInfo6(status);
+    EXPECT_EQ(proxy().readInfo3(status), 0x02030011u);
+    EXPECT_EQ(proxy().readInfo4(status), 0x20231115u);
+    EXPECT_EQ(proxy().readInfo5(status), 6u);
+    EXPECT_EQ(proxy().readInfo6(status), 41250u);
     EXPECT_EQ(last().code, infoCodes[5]);
     EXPECT_EQ(last().input, (Bytes{0, 0, 0, 0}));
 
     std::uint32_t io = 0xA1B2C3D4;
-    proxy().routingRequest1(1, 2, 3, 4, 5, 6, 7, 8, &io, status);
+    EXPECT_EQ(proxy().routingRequest1(1, 2, 3, 4, 5, 6, 7, 8, &io, status), 1u);  // the daemon answers a1
+    EXPECT_EQ(io, 0xA1B2C3D4u);                                                  // and the value as it was
     EXPECT_EQ(last().code, 0x80802004u);
     EXPECT_EQ(last().outputSize, 12u);
     const Bytes request1 = {1, 0, 0, 0, 2, 0, 0, 0, 3, 0, 0, 0, 0, 0, 0, 0, 4, 0, 0, 0, 0, 0, 0, 0, 5, 0, 0, 0,
@@ -98,12 +101,13 @@ TEST_F(Proxy, EveryRequestSendsItsPacketByteForByte) {
     EXPECT_EQ(last().input, request1);
     io = 9;
     proxy().routingRequest3(0x0102, 0x0304, &io, status);
+    EXPECT_EQ(io, 9u);
     EXPECT_EQ(last().code, 0x8080200Cu);
     EXPECT_EQ(last().input, (Bytes{2, 1, 0, 0, 0, 0, 0, 0, 4, 3, 0, 0, 0, 0, 0, 0, 9, 0, 0, 0, 0, 0, 0, 0}));
     proxy().routingRequest8(0x05, 0x06, status);
     EXPECT_EQ(last().code, 0x80802020u);
     EXPECT_EQ(last().input, (Bytes{5, 0, 0, 0, 0, 0, 0, 0, 6, 0, 0, 0, 0, 0, 0, 0}));
-    proxy().routingRequest10(1, 2, 3, 4, status);
+    EXPECT_EQ(proxy().routingRequest10(1, 2, 3, 4, status), 1u);
     EXPECT_EQ(last().code, 0x8080202Cu);
     EXPECT_EQ(last().outputSize, 8u);
     const Bytes request10 = last().input;
@@ -116,6 +120,9 @@ TEST_F(Proxy, EveryRequestSendsItsPacketByteForByte) {
         (proxy().*request)(0x0A, status);
         EXPECT_EQ(last().input, (Bytes{0x0A, 0, 0, 0, 0, 0, 0, 0}));
     }
+    std::uint32_t served = 0;
+    proxy().routingRequest0(&served, status);
+    EXPECT_EQ(served, 10u);  // every routing request so far, this one included
     EXPECT_EQ(status.code, 0);
 
     // Null pointers for values the request reads or writes: a status, nothing sent.
