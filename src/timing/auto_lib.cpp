@@ -28,9 +28,28 @@ zrerr::Exception loaderFailure(int line, const char* what, const char* key, cons
 AutoLib::~AutoLib() { platform::unloadLibrary(_module); }
 
 void AutoLib::load(const std::string& fileName) {
+    zrerr::Exception status;
+    if (!load(fileName, status)) throw status;
+}
+
+bool AutoLib::load(const std::string& fileName, zrerr::ExceptionBase& status) {
     std::string error;
     _module = platform::loadLibrary(fileName, error);
-    if (!_module) throw loaderFailure(__LINE__, "failed to zrdynlib_load library", "path", fileName, error);
+    if (!_module) status.merge(loaderFailure(__LINE__, "failed to zrdynlib_load library", "path", fileName, error));
+    return _module != nullptr;
+}
+
+bool AutoLib::resolveInOrder(const char* const* names, void** slots, std::size_t count,
+                             zrerr::ExceptionBase& status) {
+    for (std::size_t i = 0; i < count; ++i) {
+        std::string error;
+        slots[i] = platform::findSymbol(_module, names[i], error);
+        if (!slots[i]) {
+            status.merge(loaderFailure(__LINE__, "failed to get symbol", "zrdynlib_symbol", names[i], error));
+            return false;
+        }
+    }
+    return true;
 }
 
 void AutoLib::resolve(const char* const* names, void** slots, std::size_t count) {

@@ -4,6 +4,10 @@
 #include <cstddef>
 #include <string>
 
+namespace zrerr {
+class ExceptionBase;
+}
+
 namespace zrdynlib {
 
 // Owns one loaded library; unloads it when destroyed.
@@ -20,6 +24,13 @@ protected:
     // Resolves every name into its slot; all are tried, then the first failure is raised with
     // -52005 naming its symbol.
     void resolve(const char* const* names, void** slots, std::size_t count);
+
+    // The same, recording failures in `status` instead of raising them. `load` is true when the
+    // library is loaded; `resolveInOrder` stops at the first name that is missing (it and the
+    // later slots stay null) and is true when every name was found.
+    bool load(const std::string& fileName, zrerr::ExceptionBase& status);
+    bool resolveInOrder(const char* const* names, void** slots, std::size_t count,
+                        zrerr::ExceptionBase& status);
 
 private:
     void* _module = nullptr;

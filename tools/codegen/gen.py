@@ -5,7 +5,8 @@ operations.tsv feeds the session base class, the call-tracing session and (with 
 the exported functions, the version script and the Windows module definition; statuses.tsv
 feeds the message table; attributes.tsv the time-service attribute dictionary; both attribute
 tables the list of attributes that the tiktal command knows by name; roco_functions.tsv the C
-interface of the routing service and the library's table of its functions; device_requests.tsv the
+interface of the routing service and the library's table of its functions; qpxi_functions.tsv the
+same for the PXI chassis query library; device_requests.tsv the
 timing module's driver requests, for the library's proxy and for the device daemon."""
 import argparse
 import os
@@ -274,27 +275,36 @@ const AttributeInfo kAttributes[] = {{
 """
 
 ROCO_FUNCTION_COUNT = 56
+QPXI_FUNCTION_COUNT = 17
+
+
+def load_functions(tables, file_name, first, count):
+    """The rows of a library's function table, numbered first, first + 1, ... in order."""
+    rows = read_tsv(os.path.join(tables, file_name))
+    functions = [dict(index=int(i), name=n, result=r, params=parse_params(p)) for i, n, r, p in rows]
+    if [f["index"] for f in functions] != list(range(first, first + count)):
+        raise SystemExit(f"{file_name}: expected the rows {first} to {first + count - 1} in order")
+    return functions
 
 
 def load_roco_functions(tables):
-    rows = read_tsv(os.path.join(tables, "roco_functions.tsv"))
-    functions = [dict(index=int(i), name=n, result=r, params=parse_params(p)) for i, n, r, p in rows]
-    if [f["index"] for f in functions] != list(range(ROCO_FUNCTION_COUNT)):
-        raise SystemExit(f"roco_functions.tsv: expected the rows 0 to {ROCO_FUNCTION_COUNT - 1} in order")
-    return functions
+    return load_functions(tables, "roco_functions.tsv", 0, ROCO_FUNCTION_COUNT)
 
 
 def c_params(params):
     return ", ".join(f"{t} {n}" for t, n in params) or "void"
 
 
-def gen_roco_header(functions):
-    typedefs = "\n".join(f"typedef {f['result']} (*zrrocoapi_{f['name']}_fn)({c_params(f['params'])});" for f in functions)
-    prototypes = "\n".join(f"ZRROCOAPI_EXPORT {f['result']} zrrocoapi_{f['name']}({c_params(f['params'])});"
+def gen_c_header(functions, prefix, table, what, types=""):
+    """The C interface of a library that reports through the JSON status record: the record, the
+    library's own `types`, and a typedef and a prototype for each function."""
+    macro = prefix.upper()
+    typedefs = "\n".join(f"typedef {f['result']} (*{prefix}_{f['name']}_fn)({c_params(f['params'])});" for f in functions)
+    prototypes = "\n".join(f"{macro}_EXPORT {f['result']} {prefix}_{f['name']}({c_params(f['params'])});"
                            for f in functions)
-    return f"""/* Generated from src/tables/roco_functions.tsv: the C interface of the routing service. */
-#ifndef ZRROCOAPI_H
-#define ZRROCOAPI_H
+    return f"""/* Generated from src/tables/{table}: the C interface of {what}. */
+#ifndef {macro}_H
+#define {macro}_H
 
 #include <stdint.h>
 
@@ -305,19 +315,19 @@ extern "C" {{
 /* The status record of one call: the caller makes a fresh one with code 0 and no text; a failing
    call sets a negative code (a warning a positive one) and writes a JSON object into the text,
    after asking the caller's reallocate for room. */
-typedef struct zrrocoapi_Status zrrocoapi_Status;
+typedef struct {prefix}_Status {prefix}_Status;
 /* Makes room for `capacity` bytes of text, or frees the text when it is 0; nonzero on success.
    A capacity above 0x7FFFFFFF fails. */
-typedef int32_t (*zrrocoapi_Reallocate)(zrrocoapi_Status* status, uint32_t capacity);
-struct zrrocoapi_Status {{
+typedef int32_t (*{prefix}_Reallocate)({prefix}_Status* status, uint32_t capacity);
+struct {prefix}_Status {{
     int32_t code;
     uint32_t capacity;
-    zrrocoapi_Reallocate reallocate;
+    {prefix}_Reallocate reallocate;
     char* json;
 }};
-
-#ifndef ZRROCOAPI_EXPORT
-#define ZRROCOAPI_EXPORT
+{types}
+#ifndef {macro}_EXPORT
+#define {macro}_EXPORT
 #endif
 
 {typedefs}
@@ -330,6 +340,10 @@ struct zrrocoapi_Status {{
 
 #endif
 """
+
+
+def gen_roco_header(functions):
+    return gen_c_header(functions, "zrrocoapi", "roco_functions.tsv", "the routing service")
 
 
 def gen_roco_table(functions):
@@ -384,6 +398,84 @@ private:
 }};
 
 }}  // namespace zrrocoapi::dynlib
+"""
+
+
+def load_qpxi_functions(tables):
+    return load_functions(tables, "qpxi_functions.tsv", 1, QPXI_FUNCTION_COUNT)
+
+
+QPXI_TYPES = """
+/* The PCI address of a device as the library takes it: 16 bytes, the first word 0. */
+typedef struct zrqpxi_PciAddress {
+    uint32_t reserved;
+    uint32_t bus;
+    uint32_t device;
+    uint32_t function;
+} zrqpxi_PciAddress;
+"""
+
+
+def gen_qpxi_header(functions):
+    return gen_c_header(functions, "zrqpxi", "qpxi_functions.tsv", "the PXI chassis query library", QPXI_TYPES)
+
+
+def gen_qpxi_table(functions):
+    names = "\n".join(f'    "zrqpxi_{f["name"]}",' for f in functions)
+    decls, calls = [], []
+    for f in functions:
+        params = c_params(f["params"])
+        args = ", ".join(n for _, n in f["params"])
+        slot = f"_functions[{f['index'] - 1}]"
+        call = f"reinterpret_cast<zrqpxi_{f['name']}_fn>({slot})({args})"
+        decls.append(f"    virtual {f['result']} {f['name']}({params}) = 0;")
+        if f["params"] and f["params"][-1][0] == "zrqpxi_Status*":
+            guard = f"if (!{slot}) notLoaded(kFunctionNames[{f['index'] - 1}]);"
+        else:  # no status to report in: a function that is not loaded does nothing
+            guard = f"if (!{slot}) return{' 0' if f['result'] != 'void' else ''};"
+        calls.append(f"    {f['result']} {f['name']}({params}) override {{\n"
+                     f"        {guard}\n        return {call};\n    }}")
+    return f"""// Generated from src/tables/qpxi_functions.tsv: the PXI chassis query library's functions as
+// the library calls them, one slot per function in table order after the destructor.
+#pragma once
+
+#include <cstddef>
+
+#include "zrqpxi.h"
+
+namespace zrqpxi {{
+
+inline constexpr std::size_t kFunctionCount = {len(functions)};
+
+// The export names, in table order.
+inline constexpr const char* kFunctionNames[kFunctionCount] = {{
+{names}
+}};
+
+// The library's functions: the destructor, then slots 1 to {len(functions)} in table order.
+class QPXILibrary {{
+public:
+    virtual ~QPXILibrary() = default;
+{chr(10).join(decls)}
+}};
+
+// Raises the failure of calling `name`, a function that is not loaded.
+[[noreturn]] void notLoaded(const char* name);
+
+// The functions as loaded, all null until the loader fills them. A function that takes a status
+// record raises a failure when it is not loaded; the others then do nothing and answer 0.
+class QPXIFunctionTable : public QPXILibrary {{
+public:
+{chr(10).join(calls)}
+
+    // Function `index` of the table (0 is the first, slot 1).
+    void* function(std::size_t index) const noexcept {{ return _functions[index]; }}
+
+protected:
+    void* _functions[kFunctionCount] = {{}};
+}};
+
+}}  // namespace zrqpxi
 """
 
 
@@ -591,6 +683,9 @@ def main():
     roco = load_roco_functions(args.tables)
     files["zrrocoapi.h"] = gen_roco_header(roco)
     files["RoCoLib.h"] = gen_roco_table(roco)
+    qpxi = load_qpxi_functions(args.tables)
+    files["zrqpxi.h"] = gen_qpxi_header(qpxi)
+    files["QPXILibrary.h"] = gen_qpxi_table(qpxi)
     device_requests = load_device_requests(args.tables)
     files["deviceRequests.h"] = gen_device_request_table(device_requests)
     files["InterfaceProxyTiktal.h"], files["InterfaceProxyTiktal.cpp"] = gen_device_proxy(device_requests)

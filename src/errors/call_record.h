@@ -1,0 +1,67 @@
+// The JSON status record through which a library loaded at run time (routing service, PXI chassis
+// query library) reports one call, and the check after the call. Each library declares its own
+// record type, with the same fields: code, capacity, reallocate, json.
+#pragma once
+
+#include <cstdint>
+#include <exception>
+#include <type_traits>
+#include <utility>
+
+namespace zrerr {
+
+// The parts that do not depend on the record's type.
+namespace record {
+// Room for `wanted` bytes of text, the text kept; 0 frees it; above 0x7FFFFFFF fails. 1 or 0.
+std::int32_t reallocate(char*& json, std::uint32_t& capacity, std::uint32_t wanted) noexcept;
+// Raises a negative `code` with the record's JSON details when they are a readable object, else
+// with a site of its own in `component` saying that `library` gave none.
+[[noreturn]] void raise(std::int32_t code, const char* json, std::uint32_t capacity, const char* component,
+                        const char* library);
+}  // namespace record
+
+// A fresh record for one call: code 0 and no text; its reallocate function owns the text.
+// `Library` names the reporter: `Library::kComponent` and `Library::kName` ("the routing service").
+template <class Record, class Library>
+class CallRecord {
+public:
+    CallRecord() noexcept : _record{0, 0, &CallRecord::reallocate, nullptr} {}
+    ~CallRecord() { reallocate(&_record, 0); }
+    CallRecord(const CallRecord&) = delete;
+    CallRecord& operator=(const CallRecord&) = delete;
+
+    Record* get() noexcept { return &_record; }
+    // Raises a negative code with the library's JSON details; success and warnings pass.
+    void check() const {
+        if (_record.code < 0)
+            record::raise(_record.code, _record.json, _record.capacity, Library::kComponent, Library::kName);
+    }
+
+    // The reallocate function the library calls.
+    static std::int32_t reallocate(Record* status, std::uint32_t capacity) noexcept {
+        return status ? record::reallocate(status->json, status->capacity, capacity) : 0;
+    }
+
+private:
+    Record _record;
+};
+
+// Calls `function` with a fresh record of type `Status` as its last argument, then raises what
+// the record holds, unless an exception is already propagating (a call made while unwinding).
+template <class Status, class Function, class... Args>
+auto callWith(Function&& function, Args&&... args) {
+    Status status;
+    const auto checkUnlessUnwinding = [&status] {
+        if (std::uncaught_exceptions() == 0) status.check();
+    };
+    if constexpr (std::is_void_v<decltype(function(std::forward<Args>(args)..., status.get()))>) {
+        function(std::forward<Args>(args)..., status.get());
+        checkUnlessUnwinding();
+    } else {
+        auto result = function(std::forward<Args>(args)..., status.get());
+        checkUnlessUnwinding();
+        return result;
+    }
+}
+
+}  // namespace zrerr
