@@ -1,13 +1,10 @@
 #include "status.h"
 
 #include "json.h"
-
-#include <cstring>
+#include "status_record.h"
 
 namespace rocosim {
 namespace {
-
-constexpr std::uint32_t kMaxCapacity = 0x7FFFFFFFu;
 
 // The length of the well-formed UTF-8 sequence at `at`, 0 when there is none.
 std::size_t sequenceAt(const std::string& text, std::size_t at) {
@@ -56,14 +53,6 @@ std::string details(const char* function, const Failure& failure) {
     return print(object.get());
 }
 
-void report(zrrocoapi_Status* st, std::int32_t code, const std::string& json) {
-    if (!st) return;
-    st->code = code;
-    if (json.size() >= kMaxCapacity) return;
-    const auto needed = static_cast<std::uint32_t>(json.size() + 1);
-    if (st->capacity < needed && !(st->reallocate && st->reallocate(st, needed))) return;
-    if (!st->json || st->capacity < needed) return;
-    std::memcpy(st->json, json.c_str(), needed);
-}
+void report(zrrocoapi_Status* st, std::int32_t code, const std::string& json) { simcommon::writeStatus(st, code, json); }
 
 }  // namespace rocosim
