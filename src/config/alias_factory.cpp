@@ -1,0 +1,89 @@
+#include "config/alias_factory.h"
+
+#include <algorithm>
+
+#include "config/qpxi_items.h"
+#include "errors/zrerr.h"
+#include "support/casefold.h"
+
+namespace zrjsonconfig {
+namespace {
+
+bool isDigit(char c) { return c >= '0' && c <= '9'; }
+
+// Where the trailing decimal digits of `text` begin (its size when there are none).
+std::size_t trailingDigits(const std::string& text) {
+    std::size_t at = text.size();
+    while (at > 0 && isDigit(text[at - 1])) --at;
+    return at;
+}
+
+}  // namespace
+
+AliasesInUse aliasesOf(const std::vector<const cJSON*>& records) {
+    AliasesInUse aliases;
+    for (const cJSON* record : records) {
+        const cJSON* alias = cJSON_GetObjectItem(record, "alias");  // the name ignoring ASCII case
+        if (cJSON_IsString(alias)) aliases.emplace_back(alias->valuestring);
+    }
+    return aliases;
+}
+
+bool isInUse(std::string_view alias, const AliasesInUse& aliases) {
+    return std::any_of(aliases.begin(), aliases.end(),
+                       [alias](const std::string& used) { return support::equalsIgnoringCase(alias, used); });
+}
+
+std::string countUp(std::string text) {
+    const std::size_t first = trailingDigits(text);
+    std::size_t at = text.size();
+    while (at > first && text[at - 1] == '9') text[--at] = '0';
+    if (at > first)
+        ++text[at - 1];
+    else
+        text.insert(first, 1, '1');  // a carry past the first digit, or no digits at all
+    return text;
+}
+
+std::string firstFreeFrom(const std::string& candidate, const AliasesInUse& devices) {
+    if (!isInUse(candidate, devices)) return candidate;
+    const std::size_t firstDigit = trailingDigits(candidate);
+    std::string alias = firstDigit > 0 && candidate[firstDigit - 1] == '_' ? candidate : candidate + "_1";
+    while (isInUse(alias, devices)) alias = countUp(std::move(alias));
+    return alias;
+}
+
+std::string SimpleAliasFactory::createAlias(DeviceProperties&, const AliasesInUse& devices) {
+    return createSimpleAlias(devices);
+}
+
+std::string SimpleAliasFactory::createSimpleAlias(const AliasesInUse& devices) {
+    for (std::uint64_t n = 1;; ++n) {
+        std::string alias = _prefix + std::to_string(n);
+        if (!isInUse(alias, devices)) return alias;
+    }
+}
+
+PxiLocation locatePxiDevice(zrqpxi::QPXILibrary& library, DeviceProperties& device) {
+    std::uint32_t bus = 0, deviceNumber = 0, function = 0;
+    device.getBusPropertyU32("pciBusNumber", bus);
+    device.getBusPropertyU32("pciDeviceNumber", deviceNumber);
+    device.getBusPropertyU32("pciFunctionNumber", function);
+    try {
+        const zrqpxi::Session session(library);
+        const zrqpxi::Device found = session.openDeviceByAddr({0, bus, deviceNumber, function});
+        return {static_cast<std::int32_t>(found.getU32Attribute(zrqpxi::kChassisNumber)),
+                static_cast<std::int32_t>(found.getU32Attribute(zrqpxi::kSlotNumber))};
+    } catch (const zrerr::Exception&) {
+        return {};  // not in a chassis as far as the library knows
+    }
+}
+
+std::string PXIAliasFactory::createAlias(DeviceProperties& device, const AliasesInUse& devices) {
+    if (!_library) return _fallback.createAlias(device, devices);
+    const PxiLocation location = locatePxiDevice(*_library, device);
+    if (location.chassis <= 0 || location.slot <= 0) return _fallback.createAlias(device, devices);
+    return firstFreeFrom("PXI" + std::to_string(location.chassis) + "Slot" + std::to_string(location.slot), devices);
+}
+
+}  // namespace zrjsonconfig
