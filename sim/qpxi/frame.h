@@ -6,6 +6,7 @@
 
 #include "state.h"
 #include "status.h"
+#include "status_record.h"
 
 #include <cstdint>
 #include <initializer_list>
@@ -60,7 +61,7 @@ auto run(const char* function, std::initializer_list<std::uint64_t> args, zrqpxi
         } catch (const std::bad_alloc&) {
             json = "{}";
         }
-        report(st, failure.code, json);
+        simcommon::writeStatus(st, failure.code, json);
     }
     if constexpr (!std::is_void_v<Result>) return result;
 }

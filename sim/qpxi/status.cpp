@@ -1,7 +1,5 @@
 #include "status.h"
 
-#include "status_record.h"
-
 #include <cjson/cJSON.h>
 
 #include <new>
@@ -39,10 +37,6 @@ std::string details(const char* function, const Failure& failure) {
     std::string text(printed);
     cJSON_free(printed);
     return text;
-}
-
-void report(zrqpxi_Status* st, std::int32_t code, const std::string& json) noexcept {
-    simcommon::writeStatus(st, code, json);
 }
 
 }  // namespace qpxisim

@@ -1,4 +1,5 @@
-// Refusals of the PXI chassis query stand-in, and the writer of the caller's status record.
+// Refusals of the PXI chassis query stand-in: codes, and the details written into the caller's
+// status record (by simcommon::writeStatus).
 #pragma once
 
 #include "zrqpxi.h"
@@ -35,9 +36,5 @@ struct Failure {
 // The JSON object of a refusal of the entry point `function`; bytes outside ASCII in texts
 // become "?", so the object is always UTF-8.
 std::string details(const char* function, const Failure& failure);
-
-// Sets the code of a record (null: nothing) and writes `json` into its text when the caller's
-// reallocate gives room; a reallocate that is missing or fails leaves the text as it was.
-void report(zrqpxi_Status* st, std::int32_t code, const std::string& json) noexcept;
 
 }  // namespace qpxisim

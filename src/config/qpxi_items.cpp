@@ -7,6 +7,12 @@
 namespace zrqpxi {
 namespace {
 
+// One call of the library with a fresh status record; a failure raises.
+template <class Function>
+auto call(Function&& function) {
+    return CallStatus::call(std::forward<Function>(function));
+}
+
 // Destroys a container when the reading of it ends, also by an exception.
 class ContainerGuard {
 public:

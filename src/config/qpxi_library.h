@@ -2,8 +2,6 @@
 // slot of a PXI system a PCI device sits.
 #pragma once
 
-#include <utility>
-
 #include "QPXILibrary.h"
 #include "errors/call_record.h"
 #include "errors/zrerr.h"
@@ -16,14 +14,8 @@ struct ChassisQuery {
     static constexpr const char* kName = "The PXI chassis query library";
 };
 
-// A fresh record for one call of the library.
+// A fresh record for one call of the library; CallStatus::call(function) makes the call.
 using CallStatus = zrerr::CallRecord<zrqpxi_Status, ChassisQuery>;
-
-// Calls `function` with a fresh record as its last argument, then raises what the record holds.
-template <class Function, class... Args>
-auto call(Function&& function, Args&&... args) {
-    return zrerr::callWith<CallStatus>(std::forward<Function>(function), std::forward<Args>(args)...);
-}
 
 // The library loaded by bare file name in the system's search order. Loading never raises: a
 // missing library, or the first of its functions that is missing, is recorded in the caller's

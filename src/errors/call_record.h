@@ -31,6 +31,25 @@ public:
     CallRecord& operator=(const CallRecord&) = delete;
 
     Record* get() noexcept { return &_record; }
+
+    // Calls `function` with a fresh record as its last argument, then raises what the record
+    // holds, unless an exception is already propagating (a call made while unwinding).
+    template <class Function, class... Args>
+    static auto call(Function&& function, Args&&... args) {
+        CallRecord status;
+        const auto checkUnlessUnwinding = [&status] {
+            if (std::uncaught_exceptions() == 0) status.check();
+        };
+        if constexpr (std::is_void_v<decltype(function(std::forward<Args>(args)..., status.get()))>) {
+            function(std::forward<Args>(args)..., status.get());
+            checkUnlessUnwinding();
+        } else {
+            auto result = function(std::forward<Args>(args)..., status.get());
+            checkUnlessUnwinding();
+            return result;
+        }
+    }
+
     // Raises a negative code with the library's JSON details; success and warnings pass.
     void check() const {
         if (_record.code < 0)
@@ -45,23 +64,5 @@ public:
 private:
     Record _record;
 };
-
-// Calls `function` with a fresh record of type `Status` as its last argument, then raises what
-// the record holds, unless an exception is already propagating (a call made while unwinding).
-template <class Status, class Function, class... Args>
-auto callWith(Function&& function, Args&&... args) {
-    Status status;
-    const auto checkUnlessUnwinding = [&status] {
-        if (std::uncaught_exceptions() == 0) status.check();
-    };
-    if constexpr (std::is_void_v<decltype(function(std::forward<Args>(args)..., status.get()))>) {
-        function(std::forward<Args>(args)..., status.get());
-        checkUnlessUnwinding();
-    } else {
-        auto result = function(std::forward<Args>(args)..., status.get());
-        checkUnlessUnwinding();
-        return result;
-    }
-}
 
 }  // namespace zrerr

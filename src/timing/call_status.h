@@ -19,7 +19,7 @@ using CallStatus = zrerr::CallRecord<zrrocoapi_Status, RoutingService>;
 // Calls `function` with a fresh record as its last argument, then raises what the record holds.
 template <class Function, class... Args>
 auto call(Function&& function, Args&&... args) {
-    return zrerr::callWith<CallStatus>(std::forward<Function>(function), std::forward<Args>(args)...);
+    return CallStatus::call(std::forward<Function>(function), std::forward<Args>(args)...);
 }
 
 }  // namespace zrrocoapi

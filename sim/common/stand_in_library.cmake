@@ -1,0 +1,18 @@
+# stand_in_library(<target> FOLDER <folder> OUTPUT_NAME <name> EXPORTS <version script>
+#                  SOURCES <files...> LINK <libraries...> [DEFINITIONS <compile definitions...>])
+# builds a stand-in for a library that the driver loads by bare file name: lib<name>.so in
+# <folder>, exporting what the version script lets through.
+function(stand_in_library target)
+  cmake_parse_arguments(arg "" "FOLDER;OUTPUT_NAME;EXPORTS" "SOURCES;LINK;DEFINITIONS" ${ARGN})
+  add_library(${target} SHARED ${arg_SOURCES})
+  target_compile_definitions(${target} PRIVATE ${arg_DEFINITIONS})
+  target_link_libraries(${target} PRIVATE ${arg_LINK})
+  # Like the library it stands for, its state lasts as long as the process: a dlclose by its last
+  # user does not unload it (and tests can still read that state).
+  target_link_options(${target} PRIVATE -Wl,--version-script=${arg_EXPORTS} -Wl,-z,nodelete)
+  if(NOT TIKTAL_SANITIZE)  # sanitizer runtimes are linked into the executables only
+    target_link_options(${target} PRIVATE -Wl,--no-undefined)
+  endif()
+  set_target_properties(${target} PROPERTIES OUTPUT_NAME ${arg_OUTPUT_NAME} LIBRARY_OUTPUT_DIRECTORY ${arg_FOLDER}
+                        LINK_DEPENDS ${arg_EXPORTS})
+endfunction()
