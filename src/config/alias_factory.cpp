@@ -53,7 +53,7 @@ std::string firstFreeFrom(const std::string& candidate, const AliasesInUse& devi
     return alias;
 }
 
-std::string SimpleAliasFactory::createAlias(DeviceProperties&, const AliasesInUse& devices) {
+std::string SimpleAliasFactory::createAlias(DeviceIteratorInterface&, const AliasesInUse& devices) {
     return createSimpleAlias(devices);
 }
 
@@ -64,11 +64,10 @@ std::string SimpleAliasFactory::createSimpleAlias(const AliasesInUse& devices) {
     }
 }
 
-PxiLocation locatePxiDevice(zrqpxi::QPXILibrary& library, DeviceProperties& device) {
-    std::uint32_t bus = 0, deviceNumber = 0, function = 0;
-    device.getBusPropertyU32("pciBusNumber", bus);
-    device.getBusPropertyU32("pciDeviceNumber", deviceNumber);
-    device.getBusPropertyU32("pciFunctionNumber", function);
+PxiLocation locatePxiDevice(zrqpxi::QPXILibrary& library, DeviceIteratorInterface& device) {
+    const std::uint32_t bus = device.getBusPropertyU32("pciBusNumber");
+    const std::uint32_t deviceNumber = device.getBusPropertyU32("pciDeviceNumber");
+    const std::uint32_t function = device.getBusPropertyU32("pciFunctionNumber");
     try {
         const zrqpxi::Session session(library);
         const zrqpxi::Device found = session.openDeviceByAddr({0, bus, deviceNumber, function});
@@ -79,7 +78,7 @@ PxiLocation locatePxiDevice(zrqpxi::QPXILibrary& library, DeviceProperties& devi
     }
 }
 
-std::string PXIAliasFactory::createAlias(DeviceProperties& device, const AliasesInUse& devices) {
+std::string PXIAliasFactory::createAlias(DeviceIteratorInterface& device, const AliasesInUse& devices) {
     if (!_library) return _fallback.createAlias(device, devices);
     const PxiLocation location = locatePxiDevice(*_library, device);
     if (location.chassis <= 0 || location.slot <= 0) return _fallback.createAlias(device, devices);

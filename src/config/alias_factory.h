@@ -11,19 +11,12 @@
 #include <cjson/cJSON.h>
 
 #include "QPXILibrary.h"
+#include "config/device_iterator.h"
 
 namespace zrjsonconfig {
 
-// A discovered device, as far as alias creation asks it: its unsigned 32-bit bus properties by
-// name ("pciBusNumber", ...). A property the device does not have leaves `value` as it was;
-// a failure raises.
-class DeviceProperties {
-public:
-    virtual ~DeviceProperties() = default;
-    virtual void getBusPropertyU32(const char* name, std::uint32_t& value) = 0;
-};
-
-// The aliases of the configured devices.
+// The aliases of the configured devices. (The configured device records are not settled yet; the
+// factories need only their aliases.)
 using AliasesInUse = std::vector<std::string>;
 
 // The aliases in use among configured device records: the text of the member "alias" of each
@@ -33,8 +26,8 @@ AliasesInUse aliasesOf(const std::vector<const cJSON*>& records);
 class AliasFactoryInterface {
 public:
     virtual ~AliasFactoryInterface() = default;
-    // An alias for `device` that none of `devices` uses.
-    virtual std::string createAlias(DeviceProperties& device, const AliasesInUse& devices) = 0;
+    // An alias for `device`, the current device of a discovery, that none of `devices` uses.
+    virtual std::string createAlias(DeviceIteratorInterface& device, const AliasesInUse& devices) = 0;
 };
 
 // Numbered aliases: the prefix followed by 1, 2, 3, ..., the first that is free.
@@ -45,7 +38,7 @@ public:
     SimpleAliasFactory& operator=(const SimpleAliasFactory&) = delete;
 
     // Ignores the device.
-    std::string createAlias(DeviceProperties& device, const AliasesInUse& devices) override;
+    std::string createAlias(DeviceIteratorInterface& device, const AliasesInUse& devices) override;
     virtual std::string createSimpleAlias(const AliasesInUse& devices);
 
 private:
@@ -58,9 +51,9 @@ struct PxiLocation {
     std::int32_t slot = -1;
 };
 
-// Where the PXI chassis query library places the PCI device: unknown when it fails to say.
-// A failure of the device's own properties raises.
-PxiLocation locatePxiDevice(zrqpxi::QPXILibrary& library, DeviceProperties& device);
+// Where the PXI chassis query library places the current device of `device` by its PCI address:
+// unknown when the library fails to say. A failure of the device's own properties raises.
+PxiLocation locatePxiDevice(zrqpxi::QPXILibrary& library, DeviceIteratorInterface& device);
 
 // PXI<chassis>Slot<slot> for a device the library places in a chassis; without the library, or
 // for a device it does not place, a numbered alias with the prefix "Sync".
@@ -71,7 +64,7 @@ public:
     PXIAliasFactory(const PXIAliasFactory&) = delete;
     PXIAliasFactory& operator=(const PXIAliasFactory&) = delete;
 
-    std::string createAlias(DeviceProperties& device, const AliasesInUse& devices) override;
+    std::string createAlias(DeviceIteratorInterface& device, const AliasesInUse& devices) override;
 
 private:
     zrqpxi::QPXILibrary* _library;

@@ -1,6 +1,8 @@
 // Linux backend of the platform layer.
 #include "platform/platform.h"
 
+#include <dirent.h>
+#include <fcntl.h>
 #include <sys/socket.h>
 #include <sys/time.h>
 #include <sys/un.h>
@@ -11,6 +13,8 @@
 #include <dlfcn.h>
 #include <mutex>
 #include <new>
+#include <algorithm>
+#include <climits>
 #include <pthread.h>
 #include <unistd.h>
 #include <vector>
@@ -289,6 +293,93 @@ int DeviceWait::awaitEnd() noexcept {
 
 void DeviceWait::abandon() noexcept {
     if (_socket >= 0) ::shutdown(_socket, SHUT_RDWR);
+}
+
+// Device enumeration over the sysfs layout below $TIKTAL_SYSROOT.
+namespace {
+
+std::string sysroot() {
+    const char* root = std::getenv("TIKTAL_SYSROOT");
+    return root ? root : "";
+}
+
+// The names in a folder, sorted, without "." and ".."; 0 or the error number.
+int listFolder(const std::string& path, std::vector<std::string>& names) {
+    names.clear();
+    DIR* folder = ::opendir(path.c_str());
+    if (!folder) return errno;
+    while (const dirent* entry = ::readdir(folder))
+        if (std::strcmp(entry->d_name, ".") != 0 && std::strcmp(entry->d_name, "..") != 0) names.push_back(entry->d_name);
+    ::closedir(folder);
+    std::sort(names.begin(), names.end());
+    return 0;
+}
+
+// The PCI path of a resolved device folder ".../sys/devices/pciDDDD:BB/F1/F2/...": the functions
+// after the root folder, and the root folder's name.
+int pciPathOf(const std::string& resolved, const std::string& devices, std::string& root, std::vector<std::string>& path) {
+    if (resolved.compare(0, devices.size() + 1, devices + "/") != 0) return ENODEV;
+    std::vector<std::string> parts;
+    for (std::size_t at = devices.size() + 1, end; at < resolved.size(); at = end + 1) {
+        end = std::min(resolved.find('/', at), resolved.size());
+        parts.push_back(resolved.substr(at, end - at));
+    }
+    if (parts.size() < 2 || parts[0].compare(0, 3, "pci") != 0) return ENODEV;
+    root = parts[0];
+    path.assign(parts.begin() + 1, parts.end());
+    return 0;
+}
+
+}  // namespace
+
+int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexcept {
+    try {
+        entries.clear();
+        const std::string base = sysroot();
+        const std::string classFolder = base + "/sys/class/tiktal";
+        std::vector<std::string> names, roots;
+        if (int error = listFolder(classFolder, names)) return error == ENOENT ? 0 : error;  // no driver: no devices
+        char resolved[PATH_MAX];
+        const std::string devices = ::realpath((base + "/sys/devices").c_str(), resolved) ? resolved : "";
+        listFolder(devices, roots);
+        roots.erase(std::remove_if(roots.begin(), roots.end(), [](const std::string& n) { return n.compare(0, 3, "pci") != 0; }),
+                    roots.end());
+        for (const std::string& name : names) {
+            DeviceInterfaceEntry entry;
+            entry.name = name;
+            entry.classFolder = classFolder + "/" + name;
+            entry.interfacePath = base + "/dev/" + name;
+            if (!::realpath((entry.classFolder + "/device").c_str(), resolved)) return errno;
+            entry.pciFolder = resolved;
+            std::string root;
+            if (int error = pciPathOf(entry.pciFolder, devices, root, entry.pciPath)) return error;
+            entry.rootIndex = static_cast<int>(std::find(roots.begin(), roots.end(), root) - roots.begin());
+            entries.push_back(std::move(entry));
+        }
+        return 0;
+    } catch (const std::bad_alloc&) {
+        return ENOMEM;
+    }
+}
+
+int readAttributeFile(const std::string& path, std::string& text) noexcept {
+    const int file = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (file < 0) return errno;
+    char buffer[4097];
+    ssize_t size;
+    do size = ::read(file, buffer, sizeof buffer);
+    while (size < 0 && errno == EINTR);
+    const int error = size < 0 ? errno : size == static_cast<ssize_t>(sizeof buffer) ? EOVERFLOW : 0;
+    ::close(file);
+    if (error) return error;
+    std::size_t length = static_cast<std::size_t>(size);
+    while (length > 0 && (buffer[length - 1] == '\n' || buffer[length - 1] == '\r')) --length;
+    try {
+        text.assign(buffer, length);
+    } catch (const std::bad_alloc&) {
+        return ENOMEM;
+    }
+    return 0;
 }
 
 }  // namespace platform

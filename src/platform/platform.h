@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <vector>
 
 namespace platform {
 
@@ -53,6 +54,25 @@ std::string libraryFileName(const std::string& stem);
 // The shared installation directory that holds the run-time libraries: $ZRSHAREDDIR when set,
 // else the directory chosen when the library was configured.
 std::string sharedDirectory();
+
+// One device interface of the timing module's driver class: an entry of
+// $TIKTAL_SYSROOT/sys/class/tiktal, whose "device" link leads to the PCI device's folder.
+struct DeviceInterfaceEntry {
+    std::string name;         // the entry's name
+    std::string classFolder;  // the entry itself: device properties
+    std::string pciFolder;    // the resolved PCI device folder: bus properties
+    std::string interfacePath;  // $TIKTAL_SYSROOT/dev/<name>
+    // The PCI functions from the root down to the device ("DDDD:BB:DD.F" each) and the position of
+    // the root's pciDDDD:BB folder among the sorted pci* folders of sys/devices.
+    std::vector<std::string> pciPath;
+    int rootIndex = 0;
+};
+
+// The device interfaces present now, sorted by name; 0, or the error number of the failure.
+int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexcept;
+// The text of a small attribute file (at most 4 KiB), without its trailing line feed; 0 or the
+// error number (ENOENT for a missing file).
+int readAttributeFile(const std::string& path, std::string& text) noexcept;
 
 // The platform status of an operating-system error number (0 for 0).
 std::int32_t statusOfOsError(int error) noexcept;

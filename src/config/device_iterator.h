@@ -1,0 +1,80 @@
+// The timing modules present in the machine, one at a time, with the properties that describe
+// them and the token that names each in the configuration file.
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "platform/platform.h"
+
+namespace zrjsonconfig {
+
+class DeviceIteratorInterface {
+public:
+    virtual ~DeviceIteratorInterface() = default;
+    // Bus properties ("pciVendorID", "pciBusNumber", "pcieLinkWidth", "pciSlotPath", ...) and
+    // device properties ("serialNumber") of the current device; a missing one fails with -52006.
+    virtual std::uint32_t getBusPropertyU32(const std::string& name) = 0;
+    virtual std::string getBusPropertyString(const std::string& name) = 0;
+    virtual std::uint32_t getDevicePropertyU32(const std::string& name) = 0;
+    virtual std::string getDevicePropertyString(const std::string& name) = 0;
+    virtual std::string getInterfacePath() = 0;
+    virtual std::string getToken() = 0;
+    virtual std::string getInstanceId() = 0;
+    virtual void next() = 0;
+    virtual bool isEnd() = 0;
+};
+
+// The devices of the timing module's driver class that the platform enumerates.
+class APALDeviceIterator final : public DeviceIteratorInterface {
+public:
+    APALDeviceIterator();
+
+    std::uint32_t getBusPropertyU32(const std::string& name) override;
+    std::string getBusPropertyString(const std::string& name) override;
+    std::uint32_t getDevicePropertyU32(const std::string& name) override;
+    std::string getDevicePropertyString(const std::string& name) override;
+    std::string getInterfacePath() override;
+    std::string getToken() override;
+    std::string getInstanceId() override;
+    void next() override;
+    bool isEnd() override;
+
+private:
+    const platform::DeviceInterfaceEntry& current() const;
+
+    std::vector<platform::DeviceInterfaceEntry> _entries;
+    std::size_t _index = 0;
+};
+
+// Iterators one after the other, those already at their end left out.
+class CompositeDeviceIterator final : public DeviceIteratorInterface {
+public:
+    explicit CompositeDeviceIterator(std::vector<std::unique_ptr<DeviceIteratorInterface>> iterators);
+
+    std::uint32_t getBusPropertyU32(const std::string& name) override { return current().getBusPropertyU32(name); }
+    std::string getBusPropertyString(const std::string& name) override { return current().getBusPropertyString(name); }
+    std::uint32_t getDevicePropertyU32(const std::string& name) override { return current().getDevicePropertyU32(name); }
+    std::string getDevicePropertyString(const std::string& name) override {
+        return current().getDevicePropertyString(name);
+    }
+    std::string getInterfacePath() override { return current().getInterfacePath(); }
+    std::string getToken() override { return current().getToken(); }
+    std::string getInstanceId() override { return current().getInstanceId(); }
+    void next() override;
+    bool isEnd() override { return _position >= _iterators.size(); }
+
+private:
+    DeviceIteratorInterface& current();
+    void skipEnded();
+
+    std::vector<std::unique_ptr<DeviceIteratorInterface>> _iterators;
+    std::size_t _position = 0;
+};
+
+// The token of a device: its PCI identity and its slot path.
+std::string deviceToken(DeviceIteratorInterface& device);
+
+}  // namespace zrjsonconfig
