@@ -29,7 +29,8 @@ constexpr std::uint32_t kContainingSlot = 2;
 using PciAddress = zrqpxi_PciAddress;
 
 // One handle of the library: closed when the item is destroyed, duplicated when it is copied
-// (each copy owns a handle of its own). A moved-from item holds no handle.
+// (each copy owns a handle of its own). A moved-from item holds no handle. The library must
+// outlive its items.
 class Item {
 public:
     // Takes over `handle`, which `library` handed out.

@@ -21,7 +21,8 @@ std::int32_t reallocate(char*& json, std::uint32_t& capacity, std::uint32_t want
 }  // namespace record
 
 // A fresh record for one call: code 0 and no text; its reallocate function owns the text.
-// `Library` names the reporter: `Library::kComponent` and `Library::kName` ("the routing service").
+// `Library` names the reporter: `Library::kComponent` ("zrrocoapi") and `Library::kName` ("The routing
+// service").
 template <class Record, class Library>
 class CallRecord {
 public:
