@@ -7,8 +7,10 @@
 #include <string>
 #include <vector>
 
-#include "config/device_iterator.h"
 #include "InterfaceProxyTiktal.h"
+#include "config/alias_factory.h"
+#include "config/device_iterator.h"
+#include "config/qpxi_library.h"
 
 namespace {
 
@@ -43,6 +45,16 @@ TEST(SimulatedMachine, LaysOutModulesInSlotsThatComeAndGo) {
     ASSERT_EQ(machine("remove " + root.string() + " tiktal0"), 0);
     EXPECT_EQ(tokens(), (std::vector<std::string>{"PCI:VEN_1093&DEV_7406&SUBSYS_10937A0B&REV_02/0000:00:00:20",
                                                   "PCI:VEN_1093&DEV_7405&SUBSYS_10937A0B&REV_02/0000:01:00:18"}));
+
+    // The chassis query places every module in its slot, so each gets its PXI alias.
+    zrerr::Exception loading;
+    zrqpxi::DynamicQPXILibrary library(loading);
+    ASSERT_EQ(library.status().code(), 0) << library.status().what();
+    zrjsonconfig::PXIAliasFactory factory(&library);
+    std::vector<std::string> aliases;
+    for (zrjsonconfig::APALDeviceIterator devices; !devices.isEnd(); devices.next())
+        aliases.push_back(factory.createAlias(devices, {}));
+    EXPECT_EQ(aliases, (std::vector<std::string>{"PXI1Slot4", "PXI2Slot3"}));
 
     // With daemons, every module's interface path answers.
     ASSERT_EQ(machine("start-daemons " + root.string()), 0);
