@@ -137,11 +137,15 @@ void APALDeviceIterator::next() {
 bool APALDeviceIterator::isEnd() { return _index >= _entries.size(); }
 
 std::string deviceToken(DeviceIteratorInterface& device) {
+    // Read one after the other, so that the first unreadable property is the one reported.
+    const std::uint32_t vendor = device.getBusPropertyU32("pciVendorID");
+    const std::uint32_t id = device.getBusPropertyU32("pciDeviceID");
+    const std::uint32_t subsystemVendor = device.getBusPropertyU32("pciSubsystemVendorID");
+    const std::uint32_t subsystem = device.getBusPropertyU32("pciSubsystemID");
+    const std::uint32_t revision = device.getBusPropertyU32("pciRevision");
     char identity[64];
-    std::snprintf(identity, sizeof identity, "PCI:VEN_%04X&DEV_%04X&SUBSYS_%04X%04X&REV_%02X/",
-                  device.getBusPropertyU32("pciVendorID"), device.getBusPropertyU32("pciDeviceID"),
-                  device.getBusPropertyU32("pciSubsystemVendorID"), device.getBusPropertyU32("pciSubsystemID"),
-                  device.getBusPropertyU32("pciRevision"));
+    std::snprintf(identity, sizeof identity, "PCI:VEN_%04X&DEV_%04X&SUBSYS_%04X%04X&REV_%02X/", vendor, id,
+                  subsystemVendor, subsystem, revision);
     return identity + device.getBusPropertyString("pciSlotPath");
 }
 
