@@ -76,7 +76,8 @@ OsError makeDirectories(const std::string& path);
 
 // A file opened for reading and writing, with an exclusive lock over the whole file that other
 // processes and other opens of the same file in this process wait for (an open-file-description
-// lock: it belongs to this open file and ends when the file is closed).
+// lock: it belongs to this open file and ends when the file is closed). A child forked while the
+// file is open shares the open file, and so keeps the lock alive until it closes its copy too.
 class File {
 public:
     File() noexcept = default;
