@@ -188,9 +188,13 @@ void ExceptionBase::addUnsigned(const char* key, std::uint64_t value, bool neste
 }
 
 void ExceptionBase::addDetail(const char* key, const ExceptionBase& other, bool nested) noexcept {
-    if (!other._text) return;
+    addJson(key, other._text, nested);
+}
+
+void ExceptionBase::addJson(const char* key, const char* jsonText, bool nested) noexcept {
+    if (!jsonText) return;
     try {
-        DetailWriter::add(*this, nested, key, other._text);
+        DetailWriter::add(*this, nested, key, jsonText);
     } catch (...) {
         _failed = true;
     }

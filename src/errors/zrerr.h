@@ -41,6 +41,9 @@ public:
     void addUnsigned(const char* key, std::uint64_t value, bool nested = false) noexcept;
     // A member whose value is the detail text of another status (nothing when it has none).
     void addDetail(const char* key, const ExceptionBase& other, bool nested = false) noexcept;
+    // A member whose value is `jsonText`, a complete JSON value the caller built (nothing when
+    // it is null).
+    void addJson(const char* key, const char* jsonText, bool nested = false) noexcept;
     // Replaces the detail text with `jsonObject`, a complete JSON object the caller has checked:
     // the details of a component that reports in this shape. False when there is no room for it.
     bool adoptDetailText(const char* jsonObject) noexcept;

@@ -4,6 +4,7 @@
 #include <dirent.h>
 #include <fcntl.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <sys/time.h>
 #include <sys/un.h>
 
@@ -11,6 +12,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <dlfcn.h>
+#include <fcntl.h>
 #include <mutex>
 #include <new>
 #include <algorithm>
@@ -135,6 +137,160 @@ std::int32_t statusOfOsError(int error) noexcept {
     for (const OsErrorRow& row : kOsErrors)
         if (row.error == error) return row.status;
     return kUnknownOsError;
+}
+
+std::string osErrorText(int error) {
+    char buffer[256];
+    // The GNU strerror_r returns the text, which may or may not be in the buffer.
+    return strerror_r(error, buffer, sizeof buffer);
+}
+
+std::string dataDirectory() {
+    const char* root = std::getenv("TIKTAL_SYSROOT");
+    return std::string(root ? root : "") + "/var/lib/Korvane/tiktal";
+}
+
+OsError makeDirectories(const std::string& path) {
+    // Each folder on the way, from the first below the root; the last is `path` itself.
+    for (std::size_t end = path.find('/', 1);; end = path.find('/', end + 1)) {
+        const std::string folder = path.substr(0, end);
+        if (!folder.empty() && folder.back() != '/' && ::mkdir(folder.c_str(), 0777) != 0 && errno != EEXIST)
+            return {"mkdir", errno};
+        if (end == std::string::npos) break;
+    }
+    struct stat status {};
+    if (::stat(path.c_str(), &status) != 0) return {"stat", errno};
+    if (!S_ISDIR(status.st_mode)) return {"mkdir", ENOTDIR};  // a file of that name is in the way
+    return {};
+}
+
+namespace {
+
+// Sets or clears the lock over the whole file (start 0, length 0: to the end, however it grows).
+OsError setWholeFileLock(int descriptor, short type) noexcept {
+    struct flock range {};
+    range.l_type = type;
+    range.l_whence = SEEK_SET;
+    range.l_start = 0;
+    range.l_len = 0;
+    while (::fcntl(descriptor, F_OFD_SETLKW, &range) != 0)
+        if (errno != EINTR) return {"fcntl", errno};
+    return {};
+}
+
+OsError writeAll(int descriptor, const char* data, std::size_t size) noexcept {
+    while (size > 0) {
+        const ssize_t written = ::write(descriptor, data, size);
+        if (written < 0 && errno == EINTR) continue;
+        if (written < 0) return {"write", errno};
+        data += written;
+        size -= static_cast<std::size_t>(written);
+    }
+    return {};
+}
+
+OsError syncFolder(const std::string& folder) noexcept {
+    const int descriptor = ::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (descriptor < 0) return {"open", errno};
+    OsError error;
+    if (::fsync(descriptor) != 0) error = {"fsync", errno};
+    ::close(descriptor);
+    return error;
+}
+
+}  // namespace
+
+File::~File() { close(); }
+
+OsError File::open(const std::string& path, bool create) {
+    close();
+    // Without O_EXCL, opening and creating are one step: of several processes that find the file
+    // missing at once, one creates it and the others open what it created.
+    const int descriptor = ::open(path.c_str(), O_RDWR | O_CLOEXEC | (create ? O_CREAT : 0), 0666);
+    if (descriptor < 0) return {"open", errno};
+    _descriptor = descriptor;
+    _path = path;
+    return {};
+}
+
+void File::close() noexcept {
+    if (_descriptor >= 0) ::close(_descriptor);
+    _descriptor = -1;
+    _locked = false;
+}
+
+OsError File::lock() noexcept {
+    const OsError error = setWholeFileLock(_descriptor, F_WRLCK);
+    if (!error) _locked = true;
+    return error;
+}
+
+OsError File::unlock() noexcept {
+    const OsError error = setWholeFileLock(_descriptor, F_UNLCK);
+    if (!error) _locked = false;
+    return error;
+}
+
+OsError File::namesPath(bool& same) noexcept {
+    same = false;
+    struct stat opened {}, named {};
+    if (::fstat(_descriptor, &opened) != 0) return {"fstat", errno};
+    if (::stat(_path.c_str(), &named) != 0) {
+        if (errno == ENOENT) return {};  // removed: the path names no file at all
+        return {"stat", errno};
+    }
+    same = opened.st_dev == named.st_dev && opened.st_ino == named.st_ino;
+    return {};
+}
+
+OsError File::readAll(std::size_t limit, std::string& text) {
+    text.clear();
+    char block[65536];
+    for (off_t offset = 0;;) {
+        const ssize_t got = ::pread(_descriptor, block, sizeof block, offset);
+        if (got < 0 && errno == EINTR) continue;
+        if (got < 0) return {"pread", errno};
+        if (got == 0) return {};
+        // Counted before it is kept, so that a file far beyond the limit costs no more memory.
+        if (static_cast<std::size_t>(got) > limit - text.size()) {
+            text.clear();
+            return {"pread", EFBIG};
+        }
+        text.append(block, static_cast<std::size_t>(got));
+        offset += got;
+    }
+}
+
+OsError File::replace(const std::string& text) {
+    const std::size_t slash = _path.rfind('/');
+    const std::string folder = slash == std::string::npos ? "." : slash == 0 ? "/" : _path.substr(0, slash);
+    const std::string name = slash == std::string::npos ? _path : _path.substr(slash + 1);
+    // A hidden name of its own in the same folder: a rename within one file system is atomic.
+    std::string temporary = folder + "/." + name + ".XXXXXX";
+    const int descriptor = ::mkostemp(temporary.data(), O_CLOEXEC);
+    if (descriptor < 0) return {"mkostemp", errno};
+    auto fail = [&](OsError error) {
+        ::close(descriptor);
+        ::unlink(temporary.c_str());
+        return error;
+    };
+    // The new file keeps the permissions of the one it replaces (mkostemp creates it 0600).
+    struct stat old {};
+    if (::fstat(_descriptor, &old) != 0) return fail({"fstat", errno});
+    if (::fchmod(descriptor, old.st_mode & 07777) != 0) return fail({"fchmod", errno});
+    if (_locked) {
+        if (OsError error = setWholeFileLock(descriptor, F_WRLCK)) return fail(error);
+    }
+    if (OsError error = writeAll(descriptor, text.data(), text.size())) return fail(error);
+    if (::fsync(descriptor) != 0) return fail({"fsync", errno});
+    if (::rename(temporary.c_str(), _path.c_str()) != 0) return fail({"rename", errno});
+    // The path names the new file now; closing the old one ends its lock, and a process that was
+    // waiting for it finds that the path names another file.
+    const bool locked = _locked;
+    close();
+    _descriptor = descriptor;
+    _locked = locked;
+    return syncFolder(folder);
 }
 
 namespace {

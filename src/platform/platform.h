@@ -77,6 +77,65 @@ int readAttributeFile(const std::string& path, std::string& text) noexcept;
 // The platform status of an operating-system error number (0 for 0).
 std::int32_t statusOfOsError(int error) noexcept;
 
+// A system call that failed: its name and the error number it gave. `api` is null and `code` 0
+// when nothing failed.
+struct OsError {
+    const char* api = nullptr;
+    int code = 0;
+    explicit operator bool() const noexcept { return code != 0; }
+};
+
+// The system's message text of an error number.
+std::string osErrorText(int error);
+
+// The driver's data directory: $TIKTAL_SYSROOT/var/lib/Korvane/tiktal.
+std::string dataDirectory();
+// Creates the folder `path` and the missing folders on the way to it (the umask applies to
+// mode 0777); folders that exist already are no failure.
+OsError makeDirectories(const std::string& path);
+
+// A file opened for reading and writing, with an exclusive lock over the whole file that other
+// processes and other opens of the same file in this process wait for (an open-file-description
+// lock: it belongs to this open file and ends when the file is closed). A child forked while the
+// file is open shares the open file, and so keeps the lock alive until it closes its copy too.
+class File {
+public:
+    File() noexcept = default;
+    ~File();
+    File(const File&) = delete;
+    File& operator=(const File&) = delete;
+
+    // Opens `path`; when it is missing and `create`, creates it empty.
+    OsError open(const std::string& path, bool create);
+    // Closes the file; its lock, if held, ends with it.
+    void close() noexcept;
+    bool isOpen() const noexcept { return _descriptor >= 0; }
+    const std::string& path() const noexcept { return _path; }
+
+    // Waits without time limit until this open file holds the exclusive lock.
+    OsError lock() noexcept;
+    OsError unlock() noexcept;
+
+    // Whether the path still names this open file (same device and inode). A file replaced or
+    // removed since it was opened does not: a lock on it no longer guards the file at the path.
+    OsError namesPath(bool& same) noexcept;
+
+    // The whole content from its start. A file longer than `limit` bytes is not read: EFBIG.
+    OsError readAll(std::size_t limit, std::string& text);
+
+    // Replaces the file at the path with `text` so that every reader finds either the old or the
+    // new content, never a part: the text goes into a new file in the same folder, which is
+    // synced and renamed over the path; then the folder is synced. This object then holds the new
+    // file, locked when the old one was (the lock is taken before the rename, so no other process
+    // can take it in between). On a failure before the rename the old file stays as it was.
+    OsError replace(const std::string& text);
+
+private:
+    int _descriptor = -1;
+    bool _locked = false;
+    std::string _path;
+};
+
 // A connection to a device's driver at its interface path. On Linux the driver is a daemon on a
 // Unix seqpacket socket: a request is one message (u32 control code, u32 output room, the input
 // packet), its answer one message (i32 error number, u32 bytes returned, the output bytes).

@@ -60,6 +60,24 @@ TEST(DetailText, WithoutSiteMembersThereIsNoDebugObject) {
     EXPECT_STREQ(Exception().what(), "");
 }
 
+TEST(DetailText, JsonMembersKeepTheirStructureAtTheirPlaceInTheOrder) {
+    Exception e = ZRERR_RAISE(tiktalerr_invParameter);
+    e.addJson("records", "[{\"type\":\"comment\"},1]");
+    e.addJson("absent", nullptr);
+    e.debug("msg", "after");
+    e.addJson("nested", "{\"api\":\"open\"}", true);
+    Json json(e.what());
+    ASSERT_NE(json.root, nullptr) << e.what();
+    EXPECT_EQ(json.keys(json.root),
+              (std::vector<std::string>{"error_constant", "file", "line", "component", "records", "tiktal_debug"}));
+    const cJSON* records = cJSON_GetObjectItem(json.root, "records");
+    ASSERT_TRUE(cJSON_IsArray(records));
+    EXPECT_STREQ(cJSON_GetObjectItem(cJSON_GetArrayItem(records, 0), "type")->valuestring, "comment");
+    const cJSON* debug = cJSON_GetObjectItem(json.root, "tiktal_debug");
+    EXPECT_EQ(json.keys(debug), (std::vector<std::string>{"msg", "nested"}));
+    EXPECT_STREQ(cJSON_GetObjectItem(cJSON_GetObjectItem(debug, "nested"), "api")->valuestring, "open");
+}
+
 TEST(DetailText, EscapesEveryControlCharacter) {
     std::string all = "\"\\/";
     for (int c = 1; c < 32; ++c) all += static_cast<char>(c);

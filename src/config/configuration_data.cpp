@@ -1,0 +1,89 @@
+#include "config/configuration_data.h"
+
+#include <algorithm>
+#include <new>
+
+#include "config/failure.h"
+#include "json/zrjsonlh.h"
+
+namespace zrjsonconfig {
+namespace {
+
+// Adds a deep copy of `item` as member `name`.
+void addCopy(cJSON* object, const char* name, const cJSON* item) {
+    JsonTree copy = duplicate(item);
+    if (!cJSON_AddItemToObject(object, name, copy.get())) throw std::bad_alloc();
+    copy.release();
+}
+
+void addVersion(cJSON* object, const char* name, std::uint32_t value) {
+    if (!cJSON_AddNumberToObject(object, name, value)) throw std::bad_alloc();
+}
+
+}  // namespace
+
+DeviceEntry::DeviceEntry(std::string token, JsonTree configured, JsonTree provided)
+    : _token(std::move(token)), _configured(std::move(configured)), _provided(std::move(provided)) {}
+
+DeviceEntry::DeviceEntry(const DeviceEntry& other)
+    : _token(other._token), _configured(duplicate(other.configured())), _provided(duplicate(other.provided())) {}
+
+ConfigurationData::ConfigurationData(const ConfigurationData& other) {
+    for (const std::shared_ptr<DeviceEntry>& entry : other._order) {
+        auto copy = std::make_shared<DeviceEntry>(*entry);
+        _entries.emplace(copy->token(), copy);
+        _order.push_back(std::move(copy));
+    }
+}
+
+ConfigurationData& ConfigurationData::operator=(const ConfigurationData& other) {
+    if (this != &other) *this = ConfigurationData(other);
+    return *this;
+}
+
+void ConfigurationData::add(const std::string& token, JsonTree configured, JsonTree provided) {
+    zrjsonlh::checkObject(configured.get());
+    zrjsonlh::checkObject(provided.get());
+    if (_entries.count(token))
+        ZRJSONCONFIG_FAILURE(kObjectNameCollision).usage(kUsageTypeToken, token).raise();
+    auto entry = std::make_shared<DeviceEntry>(token, std::move(configured), std::move(provided));
+    _order.reserve(_order.size() + 1);  // so that nothing below can fail once the map holds it
+    _entries.emplace(token, entry);
+    _order.push_back(std::move(entry));
+}
+
+void ConfigurationData::remove(const std::string& token) {
+    const auto found = _entries.find(token);
+    if (found == _entries.end())
+        ZRJSONCONFIG_FAILURE(kErrorDeviceEntryNotFound).usage(kUsageTypeToken, token).raise();
+    _order.erase(std::find(_order.begin(), _order.end(), found->second));
+    _entries.erase(found);
+}
+
+std::shared_ptr<DeviceEntry> ConfigurationData::find(const std::string& token) const {
+    const auto found = _entries.find(token);
+    return found == _entries.end() ? nullptr : found->second;
+}
+
+JsonTree ConfigurationData::configuredJson() const {
+    JsonTree root = newObject();
+    addVersion(root.get(), "version", kSupportedVersion);
+    addVersion(root.get(), "oldest_compatible_version", kOldestSupportedVersion);
+    JsonTree devices = newObject();
+    for (const std::shared_ptr<DeviceEntry>& entry : _order)
+        addCopy(devices.get(), entry->token().c_str(), entry->configured());
+    if (!cJSON_AddItemToObject(root.get(), "devices", devices.get())) throw std::bad_alloc();
+    devices.release();
+    return root;
+}
+
+JsonTree ConfigurationData::providedJson() const {
+    JsonTree root = newObject();
+    for (const std::shared_ptr<DeviceEntry>& entry : _order)
+        addCopy(root.get(), entry->token().c_str(), entry->provided());
+    return root;
+}
+
+std::string ConfigurationData::configuredText() const { return zrjsonlh::print(configuredJson().get()); }
+
+}  // namespace zrjsonconfig

@@ -1,0 +1,73 @@
+// The device configuration as one load builds it: the configured attributes, which the file
+// keeps, and the provided attributes, which hold for this run only, of every known device.
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "config/json_tree.h"
+
+namespace zrjsonconfig {
+
+// The format version this software writes and reads, and the oldest it can still read.
+inline constexpr std::uint32_t kSupportedVersion = 1;
+inline constexpr std::uint32_t kOldestSupportedVersion = 1;
+
+// One device: its token (the matching token of enumeration) and its two attribute objects.
+class DeviceEntry {
+public:
+    DeviceEntry(std::string token, JsonTree configured, JsonTree provided);
+    DeviceEntry(const DeviceEntry& other);
+
+    const std::string& token() const noexcept { return _token; }
+    // The objects themselves, which the attribute providers fill.
+    cJSON* configured() const noexcept { return _configured.get(); }
+    cJSON* provided() const noexcept { return _provided.get(); }
+
+private:
+    std::string _token;
+    JsonTree _configured;
+    JsonTree _provided;
+};
+
+// The devices by token, ordered and compared byte by byte (case-sensitive). Entries are shared:
+// whoever holds one sees what the providers write into it. A copy is deep: it shares nothing
+// with the original.
+class ConfigurationData {
+public:
+    using Entries = std::map<std::string, std::shared_ptr<DeviceEntry>>;
+
+    ConfigurationData() = default;
+    ConfigurationData(const ConfigurationData& other);
+    ConfigurationData& operator=(const ConfigurationData& other);
+    ConfigurationData(ConfigurationData&&) noexcept = default;
+    ConfigurationData& operator=(ConfigurationData&&) noexcept = default;
+
+    // Adds a device; `configured` and `provided` must be objects (-52004). A token already
+    // known fails with -52013 ("zrapalerr_objectNameCollision") and leaves the data as it was.
+    void add(const std::string& token, JsonTree configured, JsonTree provided);
+    // Removes a device; an unknown token fails with 0xBFFA917F
+    // ("zrvll::kErrorDeviceEntryNotFound").
+    void remove(const std::string& token);
+    // The device of `token`, or null.
+    std::shared_ptr<DeviceEntry> find(const std::string& token) const;
+    const Entries& entries() const noexcept { return _entries; }
+
+    // The file form: {"version": 1, "oldest_compatible_version": 1, "devices": {token:
+    // configured attributes, ...}} with the devices in the order they were added (for a loaded
+    // file: the file's order, then devices added since).
+    JsonTree configuredJson() const;
+    // {token: provided attributes, ...} in the same order.
+    JsonTree providedJson() const;
+    // The file form as the file holds it: indented JSON text.
+    std::string configuredText() const;
+
+private:
+    Entries _entries;
+    std::vector<std::shared_ptr<DeviceEntry>> _order;  // the same entries in the order added
+};
+
+}  // namespace zrjsonconfig
