@@ -182,7 +182,7 @@ TEST(ConfigFileProcesses, AProcessWaitingOnAReplacedFileLocksAndReadsTheNewOne) 
     EXPECT_EQ(text, "third");
 }
 
-// A configuration text of about `size` bytes, different in every round; it parses only whole.
+// A configuration text of about `size` bytes, different for each `round`; it parses only whole.
 std::string largeConfiguration(int round, std::size_t size) {
     std::string text = "{\"version\":1,\"devices\":{\"round" + std::to_string(round) + "\":{\"padding\":\"";
     text.append(size, static_cast<char>('a' + round % 26));
@@ -197,10 +197,12 @@ TEST(ConfigFileProcesses, AWriterKilledWhileWritingNeverLeavesAPartialFile) {
     for (int attempt = 0; attempt < 12 && killedWhileWriting < 3; ++attempt) {
         const ino_t before = inodeOf(path);
         const pid_t writer = startProcess([&] {
+            // Made beforehand, so that the writer spends nearly all of its time writing.
+            const std::string texts[] = {largeConfiguration(1, 8 * 1024 * 1024), largeConfiguration(2, 8 * 1024 * 1024 + 4099)};
             LockableFile file(path, false);
-            for (int round = 1;; ++round) {
+            for (int round = 0;; ++round) {
                 file.lock();
-                file.write(largeConfiguration(round, 8 * 1024 * 1024 + round * 4099 % 65536));
+                file.write(texts[round % 2]);
                 file.unlock();
             }
         });
@@ -234,7 +236,7 @@ TEST(ConfigFileProcesses, AWriterKilledWhileWritingNeverLeavesAPartialFile) {
         EXPECT_EQ(loaded.data.entries().size(), 1u);
         file.unlock();
     }
-    // The writer spends nearly all of its time writing, so some kills come in the middle of it.
+    // The writer does little else than writing, so some kills come in the middle of it.
     EXPECT_GT(killedWhileWriting, 0);
 }
 
