@@ -145,10 +145,17 @@ std::string osErrorText(int error) {
     return strerror_r(error, buffer, sizeof buffer);
 }
 
-std::string dataDirectory() {
+namespace {
+
+// The root of the machine the library sees: empty on a real machine.
+std::string sysroot() {
     const char* root = std::getenv("TIKTAL_SYSROOT");
-    return std::string(root ? root : "") + "/var/lib/Korvane/tiktal";
+    return root ? root : "";
 }
+
+}  // namespace
+
+std::string dataDirectory() { return sysroot() + "/var/lib/Korvane/tiktal"; }
 
 OsError makeDirectories(const std::string& path) {
     // Each folder on the way, from the first below the root; the last is `path` itself.
@@ -453,11 +460,6 @@ void DeviceWait::abandon() noexcept {
 
 // Device enumeration over the sysfs layout below $TIKTAL_SYSROOT.
 namespace {
-
-std::string sysroot() {
-    const char* root = std::getenv("TIKTAL_SYSROOT");
-    return root ? root : "";
-}
 
 // The names in a folder, sorted, without "." and ".."; 0 or the error number.
 int listFolder(const std::string& path, std::vector<std::string>& names) {
