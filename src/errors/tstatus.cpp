@@ -4,9 +4,12 @@
 
 namespace nZRAPALS100 {
 
+bool tStatus::takes(std::int32_t newCode) const noexcept {
+    return (code == 0 && newCode != 0) || (code > 0 && newCode < 0);
+}
+
 void tStatus::merge(std::int32_t newCode, const char* newComponent, const char* newFile, std::uint32_t newLine) noexcept {
-    const bool take = (code == 0 && newCode != 0) || (code > 0 && newCode < 0);
-    if (!take) return;
+    if (!takes(newCode)) return;
     code = newCode;
     if (size < sizeof(tStatus)) return;
     std::strncpy(component, newComponent, 9);
@@ -23,8 +26,7 @@ void tStatus::merge(std::int32_t newCode, const char* newComponent, const char* 
 }
 
 void tStatus::merge(const tStatus& other) noexcept {
-    const bool take = (code == 0 && other.code != 0) || (code > 0 && other.code < 0);
-    if (!take) return;
+    if (!takes(other.code)) return;
     if (other.size < sizeof(tStatus)) {
         code = other.code;
         return;

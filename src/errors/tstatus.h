@@ -20,6 +20,10 @@ struct tStatus {
     // The same rule for a whole record: where it was set comes along, and its extension words too
     // when both records are full size.
     void merge(const tStatus& other) noexcept;
+
+private:
+    // Whether `newCode` replaces the code held now.
+    bool takes(std::int32_t newCode) const noexcept;
 };
 
 static_assert(sizeof(tStatus) == 164, "the status record is 164 bytes");

@@ -250,22 +250,33 @@ OsError File::namesPath(bool& same) noexcept {
     return {};
 }
 
-OsError File::readAll(std::size_t limit, std::string& text) {
+namespace {
+
+// The whole content of an open file from its start; a file longer than `limit` bytes is not
+// read: EFBIG, nothing kept. 0 or the error number.
+int readWhole(int descriptor, std::size_t limit, std::string& text) {
     text.clear();
     char block[65536];
     for (off_t offset = 0;;) {
-        const ssize_t got = ::pread(_descriptor, block, sizeof block, offset);
+        const ssize_t got = ::pread(descriptor, block, sizeof block, offset);
         if (got < 0 && errno == EINTR) continue;
-        if (got < 0) return {"pread", errno};
-        if (got == 0) return {};
+        if (got < 0) return errno;
+        if (got == 0) return 0;
         // Counted before it is kept, so that a file far beyond the limit costs no more memory.
         if (static_cast<std::size_t>(got) > limit - text.size()) {
             text.clear();
-            return {"pread", EFBIG};
+            return EFBIG;
         }
         text.append(block, static_cast<std::size_t>(got));
         offset += got;
     }
+}
+
+}  // namespace
+
+OsError File::readAll(std::size_t limit, std::string& text) {
+    if (const int error = readWhole(_descriptor, limit, text)) return {"pread", error};
+    return {};
 }
 
 OsError File::replace(const std::string& text) {
@@ -523,20 +534,15 @@ int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexce
 int readAttributeFile(const std::string& path, std::string& text) noexcept {
     const int file = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
     if (file < 0) return errno;
-    char buffer[4097];
-    ssize_t size;
-    do size = ::read(file, buffer, sizeof buffer);
-    while (size < 0 && errno == EINTR);
-    const int error = size < 0 ? errno : size == static_cast<ssize_t>(sizeof buffer) ? EOVERFLOW : 0;
-    ::close(file);
-    if (error) return error;
-    std::size_t length = static_cast<std::size_t>(size);
-    while (length > 0 && (buffer[length - 1] == '\n' || buffer[length - 1] == '\r')) --length;
+    int error = 0;
     try {
-        text.assign(buffer, length);
+        error = readWhole(file, 4096, text);
     } catch (const std::bad_alloc&) {
-        return ENOMEM;
+        error = ENOMEM;
     }
+    ::close(file);
+    if (error) return error == EFBIG ? EOVERFLOW : error;
+    while (!text.empty() && (text.back() == '\n' || text.back() == '\r')) text.pop_back();
     return 0;
 }
 
