@@ -4,12 +4,15 @@
 // Counting up keeps everything before the trailing digits and replaces them by their decimal
 // successor (the same width unless every digit was 9, or "1" when there were none). The free
 // alias is in use by no one (ignoring case), is the candidate itself whenever that is free, and
-// otherwise ends in digits after the candidate's text up to its own trailing digits.
+// otherwise ends in digits after the candidate's text up to its own trailing digits. The set of
+// aliases in use finds exactly the aliases that the pairwise comparison finds.
+#include <algorithm>
 #include <string>
 #include <vector>
 
 #include "config/alias_factory.h"
 #include "property.h"
+#include "support/casefold.h"
 
 namespace {
 
@@ -45,17 +48,24 @@ void checkCountUp(const std::string& text) {
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     auto [candidate, rest] = tiktalfuzz::splitAt(tiktalfuzz::bytes(data, size), '\n');
     zrjsonconfig::AliasesInUse aliases;
+    std::vector<std::string> listed;
     while (!rest.empty()) {
         const auto [alias, more] = tiktalfuzz::splitAt(rest, '\n');
-        aliases.emplace_back(alias);
+        aliases.add(alias);
+        listed.emplace_back(alias);
         rest = more;
     }
+    const auto isInUse = [&listed](const std::string& alias) {
+        return std::any_of(listed.begin(), listed.end(),
+                           [&alias](const std::string& used) { return support::equalsIgnoringCase(alias, used); });
+    };
     const std::string text(candidate);
     checkCountUp(text);
+    require(aliases.contains(text) == isInUse(text), "the set finds what the comparison finds");
 
     const std::string alias = zrjsonconfig::firstFreeFrom(text, aliases);
-    require(!zrjsonconfig::isInUse(alias, aliases), "the alias is free");
-    if (!zrjsonconfig::isInUse(text, aliases)) {
+    require(!isInUse(alias), "the alias is free");
+    if (!isInUse(text)) {
         require(alias == text, "a free candidate is taken as it is");
     } else {
         const std::size_t stem = firstTrailingDigit(text);

@@ -1,10 +1,7 @@
 #include "config/alias_factory.h"
 
-#include <algorithm>
-
 #include "config/qpxi_items.h"
 #include "errors/zrerr.h"
-#include "support/casefold.h"
 
 namespace zrjsonconfig {
 namespace {
@@ -20,20 +17,6 @@ std::size_t trailingDigits(const std::string& text) {
 
 }  // namespace
 
-AliasesInUse aliasesOf(const std::vector<const cJSON*>& records) {
-    AliasesInUse aliases;
-    for (const cJSON* record : records) {
-        const cJSON* alias = cJSON_GetObjectItem(record, "alias");  // the name ignoring ASCII case
-        if (cJSON_IsString(alias)) aliases.emplace_back(alias->valuestring);
-    }
-    return aliases;
-}
-
-bool isInUse(std::string_view alias, const AliasesInUse& aliases) {
-    return std::any_of(aliases.begin(), aliases.end(),
-                       [alias](const std::string& used) { return support::equalsIgnoringCase(alias, used); });
-}
-
 std::string countUp(std::string text) {
     const std::size_t first = trailingDigits(text);
     std::size_t at = text.size();
@@ -46,10 +29,10 @@ std::string countUp(std::string text) {
 }
 
 std::string firstFreeFrom(const std::string& candidate, const AliasesInUse& devices) {
-    if (!isInUse(candidate, devices)) return candidate;
+    if (!devices.contains(candidate)) return candidate;
     const std::size_t firstDigit = trailingDigits(candidate);
     std::string alias = firstDigit > 0 && candidate[firstDigit - 1] == '_' ? candidate : candidate + "_1";
-    while (isInUse(alias, devices)) alias = countUp(std::move(alias));
+    while (devices.contains(alias)) alias = countUp(std::move(alias));
     return alias;
 }
 
@@ -60,7 +43,7 @@ std::string SimpleAliasFactory::createAlias(DeviceIteratorInterface&, const Alia
 std::string SimpleAliasFactory::createSimpleAlias(const AliasesInUse& devices) {
     for (std::uint64_t n = 1;; ++n) {
         std::string alias = _prefix + std::to_string(n);
-        if (!isInUse(alias, devices)) return alias;
+        if (!devices.contains(alias)) return alias;
     }
 }
 

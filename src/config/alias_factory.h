@@ -5,28 +5,17 @@
 
 #include <cstdint>
 #include <string>
-#include <string_view>
-#include <vector>
-
-#include <cjson/cJSON.h>
 
 #include "QPXILibrary.h"
+#include "config/aliases_in_use.h"
 #include "config/device_iterator.h"
 
 namespace zrjsonconfig {
 
-// The aliases of the configured devices. (The configured device records are not settled yet; the
-// factories need only their aliases.)
-using AliasesInUse = std::vector<std::string>;
-
-// The aliases in use among configured device records: the text of the member "alias" of each
-// record that has one, the member name matched ignoring ASCII case.
-AliasesInUse aliasesOf(const std::vector<const cJSON*>& records);
-
 class AliasFactoryInterface {
 public:
     virtual ~AliasFactoryInterface() = default;
-    // An alias for `device`, the current device of a discovery, that none of `devices` uses.
+    // An alias for `device`, the current device of a discovery, that no configured device uses.
     virtual std::string createAlias(DeviceIteratorInterface& device, const AliasesInUse& devices) = 0;
 };
 
@@ -70,9 +59,6 @@ private:
     zrqpxi::QPXILibrary* _library;
     SimpleAliasFactory _fallback;
 };
-
-// Whether `alias` equals one of `aliases`, ignoring case.
-bool isInUse(std::string_view alias, const AliasesInUse& aliases);
 
 // `text` with its trailing decimal digits counted up by one, as text: "9" carries to the left,
 // a carry past the first digit puts "1" in front ("a_9" gives "a_10", "a_09" gives "a_10"), and

@@ -1,5 +1,6 @@
 #include <cinttypes>
 #include <cstdio>
+#include <iterator>
 
 #include "config/device_iterator.h"
 #include "errors/zrerr.h"
@@ -58,11 +59,6 @@ std::uint32_t linkSpeedCode(const std::string& text) {
     return 0;
 }
 
-std::string readFile(const std::string& path) {
-    std::string text;
-    if (const int error = platform::readAttributeFile(path, text)) fail(platform::statusOfOsError(error), "open", path);
-    return text;
-}
 
 // Bus, device and function of a PCI folder name "DDDD:BB:DD.F".
 std::uint32_t addressPart(const std::string& folder, int part, const std::string& path) {
@@ -76,6 +72,31 @@ std::uint32_t addressPart(const std::string& folder, int part, const std::string
 APALDeviceIterator::APALDeviceIterator() {
     if (const int error = platform::enumerateDeviceInterfaces(_entries))
         fail(platform::statusOfOsError(error), "opendir", "sys/class/tiktal");
+    settle();
+}
+
+void APALDeviceIterator::settle() {
+    while (_index < _entries.size() && !readCurrent()) ++_index;
+}
+
+bool APALDeviceIterator::readCurrent() {
+    const platform::DeviceInterfaceEntry& device = _entries[_index];
+    _files.clear();
+    for (const BusFile& bus : kBusFiles) _files.push_back({device.pciFolder + "/" + bus.file});
+    _files.push_back({device.classFolder + "/serial_number"});
+    bool failed = false;
+    for (FileRead& file : _files) {
+        file.error = platform::readAttributeFile(file.path, file.text);
+        failed = failed || file.error != 0;
+    }
+    return !failed || platform::exists(device.classFolder);
+}
+
+const std::string& APALDeviceIterator::fileText(std::size_t at) {
+    current();
+    const FileRead& file = _files[at];
+    if (file.error) fail(platform::statusOfOsError(file.error), "open", file.path);
+    return file.text;
 }
 
 const platform::DeviceInterfaceEntry& APALDeviceIterator::current() const {
@@ -88,11 +109,11 @@ std::uint32_t APALDeviceIterator::getBusPropertyU32(const std::string& name) {
     static const char* const kAddress[] = {"pciBusNumber", "pciDeviceNumber", "pciFunctionNumber"};
     for (int part = 0; part < 3; ++part)
         if (name == kAddress[part]) return addressPart(device.pciPath.back(), part, device.pciFolder);
-    for (const BusFile& bus : kBusFiles) {
-        if (name != bus.property) continue;
-        const std::string path = device.pciFolder + "/" + bus.file;
-        const std::string text = readFile(path);
-        return bus.form == Form::LinkSpeed ? linkSpeedCode(text) : parseNumber(text, bus.form == Form::Hex ? 16 : 10, path);
+    for (std::size_t at = 0; at < std::size(kBusFiles); ++at) {
+        if (name != kBusFiles[at].property) continue;
+        const std::string& text = fileText(at);
+        const Form form = kBusFiles[at].form;
+        return form == Form::LinkSpeed ? linkSpeedCode(text) : parseNumber(text, form == Form::Hex ? 16 : 10, _files[at].path);
     }
     fail(kNotFound, "property", name);
 }
@@ -115,13 +136,12 @@ std::string APALDeviceIterator::getBusPropertyString(const std::string& name) {
 }
 
 std::uint32_t APALDeviceIterator::getDevicePropertyU32(const std::string& name) {
-    const std::string path = current().classFolder + "/" + (name == "serialNumber" ? "serial_number" : name);
-    return parseNumber(readFile(path), 16, path);
+    return parseNumber(getDevicePropertyString(name), 16, _files.back().path);
 }
 
 std::string APALDeviceIterator::getDevicePropertyString(const std::string& name) {
     if (name != "serialNumber") fail(kNotFound, "property", name);
-    return readFile(current().classFolder + "/serial_number");
+    return fileText(std::size(kBusFiles));
 }
 
 std::string APALDeviceIterator::getInterfacePath() { return current().interfacePath; }
@@ -131,7 +151,9 @@ std::string APALDeviceIterator::getToken() { return deviceToken(*this); }
 std::string APALDeviceIterator::getInstanceId() { return "PCI\\" + current().pciPath.back(); }
 
 void APALDeviceIterator::next() {
-    if (_index < _entries.size()) ++_index;
+    if (_index >= _entries.size()) return;
+    ++_index;
+    settle();
 }
 
 bool APALDeviceIterator::isEnd() { return _index >= _entries.size(); }

@@ -1,7 +1,6 @@
 #include "config/configuration_data.h"
 
 #include <algorithm>
-#include <new>
 
 #include "config/failure.h"
 #include "json/zrjsonlh.h"
@@ -9,15 +8,10 @@
 namespace zrjsonconfig {
 namespace {
 
-// Adds a deep copy of `item` as member `name`.
-void addCopy(cJSON* object, const char* name, const cJSON* item) {
-    JsonTree copy = duplicate(item);
-    if (!cJSON_AddItemToObject(object, name, copy.get())) throw std::bad_alloc();
-    copy.release();
-}
-
-void addVersion(cJSON* object, const char* name, std::uint32_t value) {
-    if (!cJSON_AddNumberToObject(object, name, value)) throw std::bad_alloc();
+// The device's alias, or null when it has none.
+const char* aliasOf(const cJSON* configured) {
+    const cJSON* alias = cJSON_GetObjectItem(configured, "alias");
+    return cJSON_IsString(alias) ? alias->valuestring : nullptr;
 }
 
 }  // namespace
@@ -34,6 +28,7 @@ ConfigurationData::ConfigurationData(const ConfigurationData& other) {
         _entries.emplace(copy->token(), copy);
         _order.push_back(std::move(copy));
     }
+    _aliases = other._aliases;
 }
 
 ConfigurationData& ConfigurationData::operator=(const ConfigurationData& other) {
@@ -46,7 +41,9 @@ void ConfigurationData::add(const std::string& token, JsonTree configured, JsonT
     zrjsonlh::checkObject(provided.get());
     if (_entries.count(token))
         ZRJSONCONFIG_FAILURE(kObjectNameCollision).usage(kUsageTypeToken, token).raise();
+    const char* alias = aliasOf(configured.get());
     auto entry = std::make_shared<DeviceEntry>(token, std::move(configured), std::move(provided));
+    if (alias) _aliases.add(alias);
     _order.reserve(_order.size() + 1);  // so that nothing below can fail once the map holds it
     _entries.emplace(token, entry);
     _order.push_back(std::move(entry));
@@ -56,6 +53,7 @@ void ConfigurationData::remove(const std::string& token) {
     const auto found = _entries.find(token);
     if (found == _entries.end())
         ZRJSONCONFIG_FAILURE(kErrorDeviceEntryNotFound).usage(kUsageTypeToken, token).raise();
+    if (const char* alias = aliasOf(found->second->configured())) _aliases.remove(alias);
     _order.erase(std::find(_order.begin(), _order.end(), found->second));
     _entries.erase(found);
 }
@@ -67,20 +65,19 @@ std::shared_ptr<DeviceEntry> ConfigurationData::find(const std::string& token) c
 
 JsonTree ConfigurationData::configuredJson() const {
     JsonTree root = newObject();
-    addVersion(root.get(), "version", kSupportedVersion);
-    addVersion(root.get(), "oldest_compatible_version", kOldestSupportedVersion);
+    addMember(root.get(), "version", newNumber(kSupportedVersion));
+    addMember(root.get(), "oldest_compatible_version", newNumber(kOldestSupportedVersion));
     JsonTree devices = newObject();
     for (const std::shared_ptr<DeviceEntry>& entry : _order)
-        addCopy(devices.get(), entry->token().c_str(), entry->configured());
-    if (!cJSON_AddItemToObject(root.get(), "devices", devices.get())) throw std::bad_alloc();
-    devices.release();
+        addMember(devices.get(), entry->token().c_str(), duplicate(entry->configured()));
+    addMember(root.get(), "devices", std::move(devices));
     return root;
 }
 
 JsonTree ConfigurationData::providedJson() const {
     JsonTree root = newObject();
     for (const std::shared_ptr<DeviceEntry>& entry : _order)
-        addCopy(root.get(), entry->token().c_str(), entry->provided());
+        addMember(root.get(), entry->token().c_str(), duplicate(entry->provided()));
     return root;
 }
 

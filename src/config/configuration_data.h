@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include "config/aliases_in_use.h"
 #include "config/json_tree.h"
 
 namespace zrjsonconfig {
@@ -55,6 +56,9 @@ public:
     // The device of `token`, or null.
     std::shared_ptr<DeviceEntry> find(const std::string& token) const;
     const Entries& entries() const noexcept { return _entries; }
+    // The aliases of the devices as they were added: the text member "alias" (its name matched
+    // ignoring ASCII case) of each device's configured attributes that has one.
+    const AliasesInUse& aliasesInUse() const noexcept { return _aliases; }
 
     // The file form: {"version": 1, "oldest_compatible_version": 1, "devices": {token:
     // configured attributes, ...}} with the devices in the order they were added (for a loaded
@@ -68,6 +72,7 @@ public:
 private:
     Entries _entries;
     std::vector<std::shared_ptr<DeviceEntry>> _order;  // the same entries in the order added
+    AliasesInUse _aliases;
 };
 
 }  // namespace zrjsonconfig

@@ -27,7 +27,10 @@ public:
     virtual bool isEnd() = 0;
 };
 
-// The devices of the timing module's driver class that the platform enumerates.
+// The devices of the timing module's driver class that the platform enumerates. Each device's
+// property files are read when the iterator reaches it (a file that cannot be read fails when
+// its property is asked for); a device that goes away before that (a module removed while the
+// machine runs) is passed over, as it is no longer present.
 class APALDeviceIterator final : public DeviceIteratorInterface {
 public:
     APALDeviceIterator();
@@ -44,9 +47,22 @@ public:
 
 private:
     const platform::DeviceInterfaceEntry& current() const;
+    // Reads the properties of the device at the index, passing over devices that went away.
+    void settle();
+    bool readCurrent();
+    // The text of property file `at`; fails with the error of reading it.
+    const std::string& fileText(std::size_t at);
 
     std::vector<platform::DeviceInterfaceEntry> _entries;
     std::size_t _index = 0;
+    // The current device's property files, in the order of the property table, the serial
+    // number last: each file's text, or the error number of reading it.
+    struct FileRead {
+        std::string path;
+        std::string text;
+        int error = 0;
+    };
+    std::vector<FileRead> _files;
 };
 
 // Iterators one after the other, those already at their end left out.

@@ -20,10 +20,6 @@ void addNumber(cJSON* object, const char* name, double value) { checked(cJSON_Ad
 
 }  // namespace
 
-JsonTree newObject() { return JsonTree(checked(cJSON_CreateObject())); }
-JsonTree newArray() { return JsonTree(checked(cJSON_CreateArray())); }
-JsonTree duplicate(const cJSON* item) { return JsonTree(item ? checked(cJSON_Duplicate(item, true)) : nullptr); }
-
 Failure::Failure(Status status, const char* file, int line)
     : _status(status), _file(file), _line(line), _records(newArray()) {}
 
@@ -67,8 +63,7 @@ void Failure::raise() {
     JsonTree info = newObject();
     addString(info.get(), "is_debug", "0");
     addNumber(info.get(), "version", 1);
-    if (!cJSON_AddItemToObject(info.get(), "ordered_data", _records.get())) throw std::bad_alloc();
-    _records.release();  // the object owns the records now
+    addMember(info.get(), "ordered_data", std::move(_records));
     zrerr::Exception failure = zrerr::raise(_status.code, _status.constant, _file, _line);
     failure.addText("translator", kTranslator);
     failure.addJson("translator_info", zrjsonlh::printUnformatted(info.get()).c_str());

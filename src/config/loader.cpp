@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <cstring>
+#include <set>
 
 #include "config/failure.h"
 #include "support/casefold.h"
@@ -81,7 +82,8 @@ void checkVersion(const cJSON* root, const std::string& path) {
     if (fileOldest > kSupportedVersion) versionFailure(kErrorFileTooNewForSoftware, fileVersion, path);
 }
 
-void addDevices(const cJSON* root, ConfigurationData& data, const std::string& path) {
+void addDevices(const cJSON* root, ConfigurationData& data, const std::string& path,
+                AttributeProviderInterface* provider) {
     const cJSON* devices = cJSON_GetObjectItem(root, "devices");
     if (!devices) return;
     if (!cJSON_IsObject(devices))
@@ -97,20 +99,42 @@ void addDevices(const cJSON* root, ConfigurationData& data, const std::string& p
         // The same failure as the data's own, with the file named: the file must be mended.
         if (data.find(token))
             ZRJSONCONFIG_FAILURE(kObjectNameCollision).usage(kUsageTypeToken, token).usage(kUsageTypeFilePath, path).raise();
-        data.add(token, duplicate(device), newObject());
+        JsonTree configured = duplicate(device);
+        JsonTree provided = newObject();
+        if (provider) provider->provide(nullptr, data, configured.get(), provided.get());
+        data.add(token, std::move(configured), std::move(provided));
     }
 }
 
 }  // namespace
 
-LoadedConfiguration parseConfiguration(const std::string& text, const std::string& path) {
+LoadedConfiguration parseConfiguration(const std::string& text, const std::string& path,
+                                       AttributeProviderInterface* provider) {
     LoadedConfiguration loaded;
     if (text.empty()) return loaded;  // a new file: the fresh configuration
     JsonTree root = parseText(text, path);
     checkVersion(root.get(), path);
-    addDevices(root.get(), loaded.data, path);
+    addDevices(root.get(), loaded.data, path, provider);
     loaded.snapshot = std::move(root);
     return loaded;
+}
+
+void mergeDiscovered(ConfigurationData& data, DeviceIteratorInterface& devices, AttributeProviderInterface& provider) {
+    std::set<std::string> discovered;
+    for (; !devices.isEnd(); devices.next()) {
+        const std::string token = devices.getToken();
+        if (!discovered.insert(token).second)
+            ZRJSONCONFIG_FAILURE(kObjectNameCollision)
+                .usage(kUsageTypeToken, token)
+                .comment("Two devices have the same token")
+                .raise();
+        const std::shared_ptr<DeviceEntry> known = data.find(token);
+        JsonTree configured = known ? duplicate(known->configured()) : newObject();
+        JsonTree provided = newObject();
+        provider.provide(&devices, data, configured.get(), provided.get());
+        if (known) data.remove(token);
+        data.add(token, std::move(configured), std::move(provided));
+    }
 }
 
 }  // namespace zrjsonconfig

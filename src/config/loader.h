@@ -3,15 +3,17 @@
 
 #include <string>
 
+#include "config/attribute_provider.h"
 #include "config/configuration_data.h"
+#include "config/device_iterator.h"
 #include "config/json_tree.h"
 
 namespace zrjsonconfig {
 
 // What one reading of the file gives: the data with the file's devices, in file order, each with
-// a copy of its configured attributes and an empty provided object; and the file's JSON as read
-// (null for an empty file), against which a later save tells whether anything changed. Merging
-// the devices that enumeration finds comes after this, on `data`.
+// a copy of its configured attributes and the provided attributes of a device not discovered;
+// and the file's JSON as read (null for an empty file), against which a later save tells whether
+// anything changed. Merging the devices that discovery finds comes after this, on `data`.
 struct LoadedConfiguration {
     ConfigurationData data;
     JsonTree snapshot;
@@ -30,7 +32,16 @@ struct LoadedConfiguration {
 //   version above 1 with kErrorFileTooNewForSoftware (0xBFFA917D);
 // - "devices" may be missing (no devices); otherwise it and each of its members must be objects
 //   (jsonErrorsNotAnObject), and no token may come twice (-52013).
-// Other top-level members are not kept; other members of a device's object are.
-LoadedConfiguration parseConfiguration(const std::string& text, const std::string& path);
+// Other top-level members are not kept; other members of a device's object are. `provider`, when
+// given, fills each device's attributes as a device not discovered (its failures pass through);
+// without it the provided objects stay empty.
+LoadedConfiguration parseConfiguration(const std::string& text, const std::string& path,
+                                       AttributeProviderInterface* provider = nullptr);
+
+// Merges the devices that discovery finds, in its order, into `data`: a device that `data` holds
+// keeps a copy of its configured attributes and moves to the end; each gets its attributes from
+// `provider`. A token that discovery yields twice fails with -52013 (two devices would become
+// one).
+void mergeDiscovered(ConfigurationData& data, DeviceIteratorInterface& devices, AttributeProviderInterface& provider);
 
 }  // namespace zrjsonconfig

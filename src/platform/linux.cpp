@@ -272,6 +272,30 @@ int readWhole(int descriptor, std::size_t limit, std::string& text) {
     }
 }
 
+// The names in a folder, sorted, without "." and ".."; 0 or the error number.
+int listFolder(const std::string& path, std::vector<std::string>& names) {
+    names.clear();
+    DIR* folder = ::opendir(path.c_str());
+    if (!folder) return errno;
+    while (const dirent* entry = ::readdir(folder))
+        if (std::strcmp(entry->d_name, ".") != 0 && std::strcmp(entry->d_name, "..") != 0) names.push_back(entry->d_name);
+    ::closedir(folder);
+    std::sort(names.begin(), names.end());
+    return 0;
+}
+
+// Removes the temporary files that writers of `name` in `folder` left when they were killed before
+// their rename ("." + name + "." and six characters, as replace() makes them). Only a writer that
+// holds the file's lock makes one, so while the lock is held every such file is a leftover.
+void removeLeftovers(const std::string& folder, const std::string& name) {
+    const std::string prefix = "." + name + ".";
+    std::vector<std::string> names;
+    if (listFolder(folder, names) != 0) return;  // they stay until a later write
+    for (const std::string& entry : names)
+        if (entry.size() == prefix.size() + 6 && entry.compare(0, prefix.size(), prefix) == 0)
+            ::unlink((folder + "/" + entry).c_str());
+}
+
 }  // namespace
 
 OsError File::readAll(std::size_t limit, std::string& text) {
@@ -283,6 +307,7 @@ OsError File::replace(const std::string& text) {
     const std::size_t slash = _path.rfind('/');
     const std::string folder = slash == std::string::npos ? "." : slash == 0 ? "/" : _path.substr(0, slash);
     const std::string name = slash == std::string::npos ? _path : _path.substr(slash + 1);
+    if (_locked) removeLeftovers(folder, name);
     // A hidden name of its own in the same folder: a rename within one file system is atomic.
     std::string temporary = folder + "/." + name + ".XXXXXX";
     const int descriptor = ::mkostemp(temporary.data(), O_CLOEXEC);
@@ -472,18 +497,6 @@ void DeviceWait::abandon() noexcept {
 // Device enumeration over the sysfs layout below $TIKTAL_SYSROOT.
 namespace {
 
-// The names in a folder, sorted, without "." and ".."; 0 or the error number.
-int listFolder(const std::string& path, std::vector<std::string>& names) {
-    names.clear();
-    DIR* folder = ::opendir(path.c_str());
-    if (!folder) return errno;
-    while (const dirent* entry = ::readdir(folder))
-        if (std::strcmp(entry->d_name, ".") != 0 && std::strcmp(entry->d_name, "..") != 0) names.push_back(entry->d_name);
-    ::closedir(folder);
-    std::sort(names.begin(), names.end());
-    return 0;
-}
-
 // The PCI path of a resolved device folder ".../sys/devices/pciDDDD:BB/F1/F2/...": the functions
 // after the root folder, and the root folder's name.
 int pciPathOf(const std::string& resolved, const std::string& devices, std::string& root, std::vector<std::string>& path) {
@@ -518,7 +531,10 @@ int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexce
             entry.name = name;
             entry.classFolder = classFolder + "/" + name;
             entry.interfacePath = base + "/dev/" + name;
-            if (!::realpath((entry.classFolder + "/device").c_str(), resolved)) return errno;
+            if (!::realpath((entry.classFolder + "/device").c_str(), resolved)) {
+                if (errno == ENOENT) continue;  // removed while the folder was listed: not present
+                return errno;
+            }
             entry.pciFolder = resolved;
             std::string root;
             if (int error = pciPathOf(entry.pciFolder, devices, root, entry.pciPath)) return error;
@@ -529,6 +545,11 @@ int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexce
     } catch (const std::bad_alloc&) {
         return ENOMEM;
     }
+}
+
+bool exists(const std::string& path) noexcept {
+    struct stat status {};
+    return ::lstat(path.c_str(), &status) == 0;
 }
 
 int readAttributeFile(const std::string& path, std::string& text) noexcept {

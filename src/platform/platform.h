@@ -74,6 +74,9 @@ int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexce
 // error number (ENOENT for a missing file).
 int readAttributeFile(const std::string& path, std::string& text) noexcept;
 
+// Whether something (a file, a folder, a link) is at `path`.
+bool exists(const std::string& path) noexcept;
+
 // The platform status of an operating-system error number (0 for 0).
 std::int32_t statusOfOsError(int error) noexcept;
 
@@ -128,6 +131,7 @@ public:
     // synced and renamed over the path; then the folder is synced. This object then holds the new
     // file, locked when the old one was (the lock is taken before the rename, so no other process
     // can take it in between). On a failure before the rename the old file stays as it was.
+    // With the lock held it first removes the new files that killed writers left behind.
     OsError replace(const std::string& text);
 
 private:

@@ -65,6 +65,16 @@ std::optional<std::vector<char32_t>> folded(std::string_view text) {
 
 }  // namespace
 
+std::string caseFoldKey(std::string_view text) {
+    // Malformed texts equal only themselves: their bytes, marked apart from every folded text.
+    const auto folds = folded(text);
+    if (!folds) return std::string(1, '\0').append(text);
+    std::string key(1, '\1');
+    for (char32_t c : *folds)
+        for (int shift = 24; shift >= 0; shift -= 8) key.push_back(static_cast<char>((c >> shift) & 0xFF));
+    return key;
+}
+
 bool isValidUtf8(std::string_view text) { return decode(text).has_value(); }
 
 bool equalsIgnoringCase(std::string_view a, std::string_view b) {

@@ -192,14 +192,4 @@ TEST(AliasText, AFreeAliasStartsFromTheCandidateOrItsSuffixOne) {
     EXPECT_EQ(firstFreeFrom("Dev_9", {"Dev_9", "DEV_10"}), "Dev_11");
 }
 
-TEST(AliasText, AliasesInUseAreTheTextMembersNamedAliasInAnyCase) {
-    const char* texts[] = {R"({"alias": "Sync1"})", R"({"ALIAS": "PXI1Slot2"})", R"({"Alias": 5})",
-                           R"({"token": "x"})", R"({"alias": null})", R"({"aliases": "no"})"};
-    std::vector<cJSON*> parsed;
-    for (const char* text : texts) parsed.push_back(cJSON_Parse(text));
-    const AliasesInUse aliases = zrjsonconfig::aliasesOf({parsed.begin(), parsed.end()});
-    EXPECT_EQ(aliases, (AliasesInUse{"Sync1", "PXI1Slot2"}));
-    for (cJSON* item : parsed) cJSON_Delete(item);
-}
-
 }  // namespace

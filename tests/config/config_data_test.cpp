@@ -121,6 +121,36 @@ TEST(ConfigurationData, EntriesAreSharedButCopiesShareNothing) {
     EXPECT_EQ(tokensInFileOrder(copy), (std::vector<std::string>{"t", "u"}));
 }
 
+TEST(ConfigurationData, AliasesInUseFollowAddAndRemoveIgnoringCase) {
+    ConfigurationData data;
+    data.add("a", parsed(R"({"ALIAS":"PXI1Slot2"})"), zrjsonconfig::newObject());  // the name in any ASCII case
+    data.add("b", parsed(R"({"alias":"Horloge\u00c9"})"), zrjsonconfig::newObject());
+    data.add("c", parsed(R"({"alias":"horlogeé"})"), zrjsonconfig::newObject());  // the same alias, twice
+    data.add("d", parsed(R"({"alias":5,"aliases":"Sync1"})"), zrjsonconfig::newObject());
+    data.add("e", parsed(R"({"alias":null})"), zrjsonconfig::newObject());
+    const zrjsonconfig::AliasesInUse& aliases = data.aliasesInUse();
+    EXPECT_EQ(aliases.size(), 3u);
+    EXPECT_TRUE(aliases.contains("pxi1slot2"));
+    EXPECT_TRUE(aliases.contains("HORLOGEÉ"));
+    EXPECT_FALSE(aliases.contains("Sync1"));
+    EXPECT_FALSE(aliases.contains("5"));
+
+    data.remove("b");
+    EXPECT_TRUE(data.aliasesInUse().contains("horlogeé")) << "the other device still uses it";
+    const ConfigurationData copy = data;
+    data.remove("c");
+    data.remove("a");
+    EXPECT_FALSE(data.aliasesInUse().contains("Horlogeé"));
+    EXPECT_FALSE(data.aliasesInUse().contains("PXI1Slot2"));
+    EXPECT_TRUE(copy.aliasesInUse().contains("Horlogeé") && copy.aliasesInUse().contains("PXI1Slot2"));
+
+    // Malformed UTF-8 equals only the same bytes.
+    const zrjsonconfig::AliasesInUse raw{"Dev\xC3", "\xC0\xB1"};
+    EXPECT_TRUE(raw.contains("Dev\xC3"));
+    EXPECT_FALSE(raw.contains("dev\xC3"));
+    EXPECT_FALSE(raw.contains("1")) << "an overlong form is not the character";
+}
+
 // Reading the configuration file as the session factory does: open, lock, read, parse.
 class ConfigurationFile : public ::testing::Test {
 protected:

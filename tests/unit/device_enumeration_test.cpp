@@ -107,7 +107,23 @@ TEST_F(Machine, MissingAndMalformedPropertiesFail) {
     EXPECT_EQ(status([&] { devices.getBusPropertyU32("noSuchProperty"); }), -52006);
     EXPECT_EQ(status([&] { devices.getToken(); }), -52005);  // the vendor, read first, is malformed
     write(folder / "vendor", "0x1093\n");
-    EXPECT_EQ(status([&] { devices.getToken(); }), -52006);  // then the revision is missing
+    EXPECT_EQ(status([&] { devices.getToken(); }), -52005) << "the files as they were when the iterator came";
+    EXPECT_EQ(status([&] { APALDeviceIterator().getToken(); }), -52006);  // then the revision is missing
+}
+
+TEST_F(Machine, ModulesRemovedWhileEnumeratingAreNotPresent) {
+    addModule("tiktal0", "pci0000:00/0000:00:02.0");
+    addModule("tiktal1", "pci0000:00/0000:00:03.0");
+    addModule("tiktal2", "pci0000:00/0000:00:04.0");
+    // A class entry whose device is gone already.
+    fs::remove_all(root / "sys/devices/pci0000:00/0000:00:04.0");
+    APALDeviceIterator devices;
+    EXPECT_EQ(devices.getInterfacePath(), root.string() + "/dev/tiktal0");
+    // The second goes away before the iterator reaches it.
+    fs::remove_all(root / "sys/class/tiktal/tiktal1");
+    fs::remove_all(root / "sys/devices/pci0000:00/0000:00:03.0");
+    devices.next();
+    EXPECT_TRUE(devices.isEnd());
 }
 
 // An iterator over fixed tokens, for the composite.

@@ -1,0 +1,58 @@
+#include "config/pxi_attribute_provider.h"
+
+#include <boost/numeric/conversion/cast.hpp>
+
+#include "json/zrjsonlh.h"
+
+namespace zrjsonconfig {
+namespace {
+
+// A configured location member as the file holds it, -1 when missing.
+std::int32_t configuredLocation(const cJSON* configured, const char* name) {
+    const cJSON* item = cJSON_GetObjectItem(configured, name);
+    return item ? zrjsonlh::getInt32(item) : -1;
+}
+
+std::int32_t linkWidth(DeviceIteratorInterface& device, const char* name) {
+    return boost::numeric_cast<std::int32_t>(device.getBusPropertyU32(name));
+}
+
+}  // namespace
+
+void PXIAttributeProvider::provide(DeviceIteratorInterface* device, ConfigurationData&, cJSON* configured,
+                                   cJSON* provided) {
+    identifiers(device, configured);
+    pciLocation(device, provided);
+    pxiLocation(device, configured);
+}
+
+void PXIAttributeProvider::identifiers(DeviceIteratorInterface* device, cJSON* configured) {
+    if (cJSON_GetObjectItem(configured, "device_id") && cJSON_GetObjectItem(configured, "subsystem_id")) return;
+    const std::uint32_t deviceId = device ? device->getBusPropertyU32("pciDeviceID") : 0;
+    const std::uint32_t subsystemId = device ? device->getBusPropertyU32("pciSubsystemID") : 0;
+    setMember(configured, "device_id", newNumber(deviceId));
+    setMember(configured, "subsystem_id", newNumber(subsystemId));
+}
+
+void PXIAttributeProvider::pciLocation(DeviceIteratorInterface* device, cJSON* provided) {
+    setMember(provided, "pci_bus", newNumber(device ? device->getBusPropertyU32("pciBusNumber") : 0));
+    setMember(provided, "pci_device", newNumber(device ? device->getBusPropertyU32("pciDeviceNumber") : 0));
+    setMember(provided, "pci_function", newNumber(device ? device->getBusPropertyU32("pciFunctionNumber") : 0));
+    setMember(provided, "pci_link_width", newNumber(device ? linkWidth(*device, "pcieLinkWidth") : -1));
+    setMember(provided, "pci_max_link_width", newNumber(device ? linkWidth(*device, "pcieMaxLinkWidth") : -1));
+}
+
+// A discovered device is where the chassis query library finds it now (-1 when it finds it in no
+// chassis). Without the library, or for a device not discovered, the file's location stands.
+void PXIAttributeProvider::pxiLocation(DeviceIteratorInterface* device, cJSON* configured) {
+    PxiLocation location;
+    if (device && _library)
+        location = locatePxiDevice(*_library, *device);
+    else
+        location = {configuredLocation(configured, "pxi_chassis_number"),
+                    configuredLocation(configured, "pxi_slot_number")};
+    setMember(configured, "pxi_chassis_number", newNumber(location.chassis));
+    setMember(configured, "pxi_slot_number", newNumber(location.slot));
+}
+
+}  // namespace zrjsonconfig

@@ -1,0 +1,31 @@
+// The PCI identity and location of a device, and where it sits in a PXI chassis.
+#pragma once
+
+#include "QPXILibrary.h"
+#include "config/attribute_provider.h"
+
+namespace zrjsonconfig {
+
+// Configured: "device_id", "subsystem_id", "pxi_chassis_number", "pxi_slot_number" (-1 where
+// unknown). Provided: "pci_bus", "pci_device", "pci_function", "pci_link_width",
+// "pci_max_link_width" (0, 0, 0, -1, -1 for a device not discovered).
+class PXIAttributeProvider final : public AttributeProviderInterface {
+public:
+    // `library` may be null (not available): discovered devices then have no PXI location. It
+    // must outlive the provider.
+    explicit PXIAttributeProvider(zrqpxi::QPXILibrary* library) noexcept : _library(library) {}
+
+    void provide(DeviceIteratorInterface* device, ConfigurationData& data, cJSON* configured,
+                 cJSON* provided) override;
+    // "device_id" and "subsystem_id", both from the device unless the file holds both.
+    void identifiers(DeviceIteratorInterface* device, cJSON* configured);
+    // The PCI address and link widths; a width above 0x7FFFFFFF fails with the numeric overflow.
+    void pciLocation(DeviceIteratorInterface* device, cJSON* provided);
+
+private:
+    void pxiLocation(DeviceIteratorInterface* device, cJSON* configured);
+
+    zrqpxi::QPXILibrary* _library;
+};
+
+}  // namespace zrjsonconfig
