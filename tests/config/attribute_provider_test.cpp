@@ -143,19 +143,4 @@ TEST(AttributeProviders, HardwareRevisionLetterAndLinkSpeeds) {
     EXPECT_EQ(provide(speeds, nullptr, "{}"), R"({} | {"pci_link_speed":-1,"pci_link_speed_max":-1})");
 }
 
-TEST(AttributeProviders, TheDriversProviderFillsEveryAttributeInItsOrder) {
-    tiktalsae::SyncAttributeProvider provider;  // no chassis inventory here: no PXI location
-    FakeDevice device;
-    EXPECT_EQ(provide(provider, &device, R"({"note":"kept"})"),
-              R"({"note":"kept","alias":"Sync1","serial_number":"1a2b3c4d","simulated":false,"device_id":29701,)"
-              R"("subsystem_id":31243,"pxi_chassis_number":-1,"pxi_slot_number":-1} | {"is_present":true,)"
-              R"("interface_path":"/dev/tiktal0","pci_bus":3,"pci_device":4,"pci_function":1,"pci_link_width":4,)"
-              R"("pci_max_link_width":8,"hardware_revision":"C","pci_link_speed":1,"pci_link_speed_max":2})");
-    EXPECT_EQ(provide(provider, nullptr, R"({"alias":"Gone"})"),
-              R"({"alias":"Gone","serial_number":"","simulated":false,"device_id":0,"subsystem_id":0,)"
-              R"("pxi_chassis_number":-1,"pxi_slot_number":-1} | {"is_present":false,"interface_path":"",)"
-              R"("pci_bus":0,"pci_device":0,"pci_function":0,"pci_link_width":-1,"pci_max_link_width":-1,)"
-              R"("hardware_revision":"","pci_link_speed":-1,"pci_link_speed_max":-1})");
-}
-
 }  // namespace
