@@ -27,7 +27,9 @@ void PXIAttributeProvider::provide(DeviceIteratorInterface* device, Configuratio
 }
 
 void PXIAttributeProvider::identifiers(DeviceIteratorInterface* device, cJSON* configured) {
-    if (cJSON_GetObjectItem(configured, "device_id") && cJSON_GetObjectItem(configured, "subsystem_id")) return;
+    if (!device && cJSON_IsNumber(cJSON_GetObjectItem(configured, "device_id")) &&
+        cJSON_IsNumber(cJSON_GetObjectItem(configured, "subsystem_id")))
+        return;
     const std::uint32_t deviceId = device ? device->getBusPropertyU32("pciDeviceID") : 0;
     const std::uint32_t subsystemId = device ? device->getBusPropertyU32("pciSubsystemID") : 0;
     setMember(configured, "device_id", newNumber(deviceId));

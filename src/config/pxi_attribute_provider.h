@@ -17,7 +17,9 @@ public:
 
     void provide(DeviceIteratorInterface* device, ConfigurationData& data, cJSON* configured,
                  cJSON* provided) override;
-    // "device_id" and "subsystem_id", both from the device unless the file holds both.
+    // "device_id" and "subsystem_id": a discovered device's from the device (what the file holds
+    // can only be stale, or the 0 that loading the file gave it before discovery); another's as the
+    // file holds them when both are numbers, else 0.
     void identifiers(DeviceIteratorInterface* device, cJSON* configured);
     // The PCI address and link widths; a width above 0x7FFFFFFF fails with the numeric overflow.
     void pciLocation(DeviceIteratorInterface* device, cJSON* provided);
