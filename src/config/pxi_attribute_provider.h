@@ -7,7 +7,8 @@
 namespace zrjsonconfig {
 
 // Configured: "device_id", "subsystem_id", "pxi_chassis_number", "pxi_slot_number" (-1 where
-// unknown). Provided: "pci_bus", "pci_device", "pci_function", "pci_link_width",
+// unknown; a location the file holds that is not a number within 32 bits fails with -52004,
+// jsonErrorsTypeMismatch). Provided: "pci_bus", "pci_device", "pci_function", "pci_link_width",
 // "pci_max_link_width" (0, 0, 0, -1, -1 for a device not discovered).
 class PXIAttributeProvider final : public AttributeProviderInterface {
 public:
