@@ -36,8 +36,9 @@ private:
     std::vector<std::unique_ptr<AttributeProviderInterface>> _providers;
 };
 
-// "alias": a new one from the factory for a discovered device that has none; an alias that is
-// there is never changed.
+// "alias": a new one from the factory for a discovered device that has none (a member "alias"
+// that is not text is none: no one could open the device by it); an alias that is there is never
+// changed.
 class AliasAttributeProvider final : public AttributeProviderInterface {
 public:
     // `factory` must outlive the provider.

@@ -13,8 +13,8 @@ void CompositeAttributeProvider::provide(DeviceIteratorInterface* device, Config
 
 void AliasAttributeProvider::provide(DeviceIteratorInterface* device, ConfigurationData& data, cJSON* configured,
                                      cJSON*) {
-    if (!device || cJSON_GetObjectItem(configured, "alias")) return;
-    addMember(configured, "alias", newString(_factory.createAlias(*device, data.aliasesInUse())));
+    if (!device || cJSON_IsString(cJSON_GetObjectItem(configured, "alias"))) return;
+    setMember(configured, "alias", newString(_factory.createAlias(*device, data.aliasesInUse())));
 }
 
 void SerialNumberAttributeProvider::provide(DeviceIteratorInterface* device, ConfigurationData&, cJSON* configured,

@@ -2,15 +2,22 @@
 
 #include <boost/numeric/conversion/cast.hpp>
 
+#include "config/failure.h"
 #include "json/zrjsonlh.h"
 
 namespace zrjsonconfig {
 namespace {
 
-// A configured location member as the file holds it, -1 when missing.
+// A configured location member as the file holds it, -1 when missing. A value that is not a
+// number within 32 bits fails as the file's other mistyped members do, naming the member.
 std::int32_t configuredLocation(const cJSON* configured, const char* name) {
     const cJSON* item = cJSON_GetObjectItem(configured, name);
-    return item ? zrjsonlh::getInt32(item) : -1;
+    if (!item) return -1;
+    if (!cJSON_IsNumber(item) || !(item->valuedouble > -2147483649.0 && item->valuedouble < 2147483648.0))
+        ZRJSONCONFIG_FAILURE(kTypeMismatch)
+            .comment(std::string("\"") + name + "\" is not a number within 32 bits")
+            .raise();
+    return zrjsonlh::getInt32(item);
 }
 
 std::int32_t linkWidth(DeviceIteratorInterface& device, const char* name) {
@@ -27,7 +34,9 @@ void PXIAttributeProvider::provide(DeviceIteratorInterface* device, Configuratio
 }
 
 void PXIAttributeProvider::identifiers(DeviceIteratorInterface* device, cJSON* configured) {
-    if (cJSON_GetObjectItem(configured, "device_id") && cJSON_GetObjectItem(configured, "subsystem_id")) return;
+    if (!device && cJSON_IsNumber(cJSON_GetObjectItem(configured, "device_id")) &&
+        cJSON_IsNumber(cJSON_GetObjectItem(configured, "subsystem_id")))
+        return;
     const std::uint32_t deviceId = device ? device->getBusPropertyU32("pciDeviceID") : 0;
     const std::uint32_t subsystemId = device ? device->getBusPropertyU32("pciSubsystemID") : 0;
     setMember(configured, "device_id", newNumber(deviceId));
