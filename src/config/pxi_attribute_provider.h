@@ -12,8 +12,8 @@ namespace zrjsonconfig {
 // "pci_max_link_width" (0, 0, 0, -1, -1 for a device not discovered).
 class PXIAttributeProvider final : public AttributeProviderInterface {
 public:
-    // `library` may be null (not available): discovered devices then have no PXI location. It
-    // must outlive the provider.
+    // `library` may be null (not available): the file's PXI location of a discovered device then
+    // stands. It must outlive the provider.
     explicit PXIAttributeProvider(zrqpxi::QPXILibrary* library) noexcept : _library(library) {}
 
     void provide(DeviceIteratorInterface* device, ConfigurationData& data, cJSON* configured,

@@ -72,6 +72,8 @@ TEST(AttributeProviders, AliasIsMadeOnceForADiscoveredDeviceAndNeverChanged) {
     EXPECT_EQ(provide(aliases, &device, R"({"alias":"Mine"})", data), R"({"alias":"Mine"} | {})");
     EXPECT_EQ(provide(aliases, &device, R"({"Alias":"Mine"})", data), R"({"Alias":"Mine"} | {})")
         << "the member in any case is the alias";
+    EXPECT_EQ(provide(aliases, &device, R"({"alias":null,"n":1})", data), R"({"alias":"Sync2","n":1} | {})")
+        << "no one could open a device by an alias that is not text";
     EXPECT_EQ(provide(aliases, nullptr, "{}", data), "{} | {}") << "a device of the file alone gets none";
 }
 
@@ -107,9 +109,13 @@ TEST(AttributeProviders, PciIdentityAndLocationWithoutTheChassisLibrary) {
               R"({"device_id":29701,"subsystem_id":31243,"pxi_chassis_number":-1,"pxi_slot_number":-1} | )"
               R"({"pci_bus":3,"pci_device":4,"pci_function":1,"pci_link_width":4,"pci_max_link_width":8})")
         << "one identifier alone: both from the hardware";
-    EXPECT_EQ(provide(pxi, &device, R"({"device_id":1,"subsystem_id":2})"),
+    EXPECT_EQ(provide(pxi, &device, R"({"device_id":0,"subsystem_id":0})"),
+              R"({"device_id":29701,"subsystem_id":31243,"pxi_chassis_number":-1,"pxi_slot_number":-1} | )"
+              R"({"pci_bus":3,"pci_device":4,"pci_function":1,"pci_link_width":4,"pci_max_link_width":8})")
+        << "a discovered device is what the hardware says";
+    EXPECT_EQ(provide(pxi, nullptr, R"({"device_id":1,"subsystem_id":2})"),
               R"({"device_id":1,"subsystem_id":2,"pxi_chassis_number":-1,"pxi_slot_number":-1} | )"
-              R"({"pci_bus":3,"pci_device":4,"pci_function":1,"pci_link_width":4,"pci_max_link_width":8})");
+              R"({"pci_bus":0,"pci_device":0,"pci_function":0,"pci_link_width":-1,"pci_max_link_width":-1})");
     EXPECT_EQ(provide(pxi, nullptr, R"({"device_id":1})"),
               R"({"device_id":0,"subsystem_id":0,"pxi_chassis_number":-1,"pxi_slot_number":-1} | )"
               R"({"pci_bus":0,"pci_device":0,"pci_function":0,"pci_link_width":-1,"pci_max_link_width":-1})");
