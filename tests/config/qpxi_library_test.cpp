@@ -237,6 +237,22 @@ TEST_F(QpxiLibrary, ANewSessionSeesTheFileAsItIsNow) {
     EXPECT_EQ(chassis[0].getStringAttribute(0x1001), 0u) << "no model: an empty text";
 }
 
+TEST_F(QpxiLibrary, ANewSessionSeesARewriteOfTheSameSizeAndModificationTime) {
+    const auto chassisNumber = [&] {
+        const zrqpxi::Session session(library);
+        return session.getChassis().at(0).getU32Attribute(zrqpxi::kChassisNumber);
+    };
+    sysroot.writeInventory(R"({"chassis": [{"number": 1}]})");
+    const auto modified = std::filesystem::last_write_time(sysroot.inventory());
+    EXPECT_EQ(chassisNumber(), 1u);
+    // Rewritten in place as a copy that keeps the times does, or twice within one clock tick.
+    for (const std::uint32_t number : {2u, 1u}) {
+        sysroot.writeInventory(R"({"chassis": [{"number": )" + std::to_string(number) + "}]}");
+        std::filesystem::last_write_time(sysroot.inventory(), modified);
+        EXPECT_EQ(chassisNumber(), number);
+    }
+}
+
 TEST_F(QpxiLibrary, NoInventoryFileIsAMachineWithoutChassis) {
     std::filesystem::remove(sysroot.inventory());
     const zrqpxi::Session session(library);
