@@ -207,6 +207,11 @@ void State::invalidateAll() {
     _changed.notify_all();
 }
 
+void State::logCall(std::string line) {
+    log.push_back(std::move(line));
+    if (log.size() > kLogLines) log.pop_front();
+}
+
 void State::clear() {
     invalidateAll();
     _items.clear();

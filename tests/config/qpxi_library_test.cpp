@@ -3,6 +3,7 @@
 // in a temporary machine, and the handles they leave open: none.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <atomic>
 #include <chrono>
 #include <thread>
@@ -122,6 +123,16 @@ TEST_F(QpxiLibrary, ReadsAnAddressAsFunctionDeviceThenBus) {
     const std::string h = std::to_string(device.handle());
     EXPECT_EQ(standIn.log().substr(before),
               "getU32Attribute(" + h + ",12290)\ngetU32Attribute(" + h + ",12289)\ngetU32Attribute(" + h + ",12288)\n");
+}
+
+TEST_F(QpxiLibrary, TheLogKeepsTheLast65536Calls) {
+    constexpr std::uint32_t kKept = 65536, kCalls = kKept + 10;
+    for (std::uint32_t unknown = 1; unknown <= kCalls; ++unknown) library.close(unknown);
+    const std::string log = standIn.log();
+    EXPECT_EQ(std::count(log.begin(), log.end(), '\n'), kKept);
+    EXPECT_EQ(log.substr(0, log.find('\n')), "close(11)") << "the first ten calls are gone";
+    const std::string last = "\nclose(" + std::to_string(kCalls) + ")\n";
+    EXPECT_EQ(log.substr(log.size() - last.size()), last);
 }
 
 TEST_F(QpxiLibrary, ReadsAContainerByDuplicatingAndClosingEachItemThenDestroysIt) {
