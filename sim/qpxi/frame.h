@@ -41,7 +41,7 @@ auto run(const char* function, std::initializer_list<std::uint64_t> args, zrqpxi
     {
         Lock lock(stateLock());
         try {
-            state().log.push_back(logLine(function, args));
+            state().logCall(logLine(function, args));
             if constexpr (std::is_void_v<Result>)
                 invoke(work, state(), lock);
             else

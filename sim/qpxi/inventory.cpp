@@ -11,7 +11,6 @@
 #include <cstring>
 #include <memory>
 #include <set>
-#include <tuple>
 
 namespace qpxisim {
 namespace {
@@ -88,6 +87,19 @@ Chassis readChassis(const cJSON* item, const std::string& where) {
     return chassis;
 }
 
+// Enters the devices of the last chassis read in the inventory's places.
+void placeDevices(Inventory& inventory, const std::string& where) {
+    const std::size_t c = inventory.chassis.size() - 1;
+    const std::vector<Slot>& slots = inventory.chassis[c].slots;
+    for (std::size_t s = 0; s < slots.size(); ++s)
+        for (std::size_t d = 0; d < slots[s].devices.size(); ++d) {
+            const PciDevice& device = slots[s].devices[d];
+            const PciKey key{device.bus, device.device, device.function};
+            if (!inventory.places.emplace(key, DevicePlace{c, s, d}).second)
+                malformed(where, "a PCI address that is already in another slot");
+        }
+}
+
 }  // namespace
 
 std::string inventoryPath() {
@@ -101,30 +113,26 @@ Inventory parseInventory(const std::string& text) {
     object(root.get(), "the file");
     Inventory inventory;
     std::set<std::uint32_t> chassisNumbers;
-    std::set<std::tuple<std::uint32_t, std::uint32_t, std::uint32_t>> addresses;
     const cJSON* entry;
     int index = 0;
     cJSON_ArrayForEach(entry, list(root.get(), "chassis", "the file")) {
         const std::string at = "chassis[" + std::to_string(index++) + "]";
         inventory.chassis.push_back(readChassis(entry, at));
-        const Chassis& chassis = inventory.chassis.back();
-        if (!chassisNumbers.insert(chassis.number).second) malformed(at, "a second chassis of this number");
-        for (const Slot& slot : chassis.slots)
-            for (const PciDevice& d : slot.devices)
-                if (!addresses.insert({d.bus, d.device, d.function}).second)
-                    malformed(at, "a PCI address that is already in another slot");
+        if (!chassisNumbers.insert(inventory.chassis.back().number).second)
+            malformed(at, "a second chassis of this number");
+        placeDevices(inventory, at);
     }
     return inventory;
 }
 
-std::shared_ptr<const Inventory> readInventory(const std::string& path) {
+bool readInventoryText(const std::string& path, std::string& text) {
     FILE* file = std::fopen(path.c_str(), "rb");
-    if (!file && errno == ENOENT) return std::make_shared<const Inventory>();
+    if (!file && errno == ENOENT) return false;
     const auto refuse = [&path](const std::string& what) {
         throw Failure{code::kBadInventory, what, {{"path", path}}, {}};
     };
     if (!file) refuse(std::string("cannot open the inventory file: ") + std::strerror(errno));
-    std::string text;
+    text.clear();
     char buffer[4096];
     std::size_t got;
     while ((got = std::fread(buffer, 1, sizeof buffer, file)) > 0 && text.size() <= kMaxInventoryBytes)
@@ -133,6 +141,10 @@ std::shared_ptr<const Inventory> readInventory(const std::string& path) {
     std::fclose(file);
     if (failed) refuse("cannot read the inventory file");
     if (text.size() > kMaxInventoryBytes) refuse("the inventory file is larger than 1 MiB");
+    return true;
+}
+
+std::shared_ptr<const Inventory> parseInventoryOf(const std::string& text, const std::string& path) {
     try {
         return std::make_shared<const Inventory>(parseInventory(text));
     } catch (Failure& failure) {

@@ -89,15 +89,10 @@ std::uint32_t State::openDeviceByAddr(std::uint32_t session, const zrqpxi_PciAdd
     if (!address) fail(code::kInvalidArgument, "no address");
     if (address->reserved != 0) failNumbered(code::kInvalidArgument, "the address's first word is not 0", "reserved",
                                              address->reserved);
-    const auto& chassis = owner->inventory->chassis;
-    for (std::size_t c = 0; c < chassis.size(); ++c)
-        for (std::size_t s = 0; s < chassis[c].slots.size(); ++s) {
-            const auto& devices = chassis[c].slots[s].devices;
-            for (std::size_t d = 0; d < devices.size(); ++d)
-                if (devices[d].bus == address->bus && devices[d].device == address->device &&
-                    devices[d].function == address->function)
-                    return open(Item{Kind::device, owner, c, s, d});
-        }
+    const auto& places = owner->inventory->places;
+    const auto found = places.find(PciKey{address->bus, address->device, address->function});
+    if (found != places.end())
+        return open(Item{Kind::device, owner, found->second.chassis, found->second.slot, found->second.index});
     throw Failure{code::kNoSuchItem, "no device at this address in any slot", {},
                   {{"bus", address->bus}, {"device", address->device}, {"function", address->function}}};
 }
@@ -210,6 +205,11 @@ std::int32_t State::cancelWaits(std::uint32_t session) {
 void State::invalidateAll() {
     for (auto& [handle, item] : _items) item.session->invalidated = true;
     _changed.notify_all();
+}
+
+void State::logCall(std::string line) {
+    log.push_back(std::move(line));
+    if (log.size() > kLogLines) log.pop_front();
 }
 
 void State::clear() {

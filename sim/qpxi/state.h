@@ -8,6 +8,7 @@
 
 #include <condition_variable>
 #include <cstdint>
+#include <deque>
 #include <map>
 #include <memory>
 #include <mutex>
@@ -76,7 +77,11 @@ public:
     // Closes every handle and container and ends every wait; handles go on counting.
     void clear();
 
-    std::vector<std::string> log;
+    // Adds a call to the log, which keeps the last kLogLines calls: a process that goes on calling
+    // does not grow without end.
+    void logCall(std::string line);
+    static constexpr std::size_t kLogLines = 1 << 16;
+    std::deque<std::string> log;
 
 private:
     std::uint32_t newHandle();

@@ -3,6 +3,7 @@
 // in a temporary machine, and the handles they leave open: none.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <atomic>
 #include <chrono>
 #include <thread>
@@ -124,6 +125,16 @@ TEST_F(QpxiLibrary, ReadsAnAddressAsFunctionDeviceThenBus) {
               "getU32Attribute(" + h + ",12290)\ngetU32Attribute(" + h + ",12289)\ngetU32Attribute(" + h + ",12288)\n");
 }
 
+TEST_F(QpxiLibrary, TheLogKeepsTheLast65536Calls) {
+    constexpr std::uint32_t kKept = 65536, kCalls = kKept + 10;
+    for (std::uint32_t unknown = 1; unknown <= kCalls; ++unknown) library.close(unknown);
+    const std::string log = standIn.log();
+    EXPECT_EQ(std::count(log.begin(), log.end(), '\n'), kKept);
+    EXPECT_EQ(log.substr(0, log.find('\n')), "close(11)") << "the first ten calls are gone";
+    const std::string last = "\nclose(" + std::to_string(kCalls) + ")\n";
+    EXPECT_EQ(log.substr(log.size() - last.size()), last);
+}
+
 TEST_F(QpxiLibrary, ReadsAContainerByDuplicatingAndClosingEachItemThenDestroysIt) {
     const zrqpxi::Session session(library);
     const zrqpxi::Chassis chassis = session.openChassisByNumber(1);
@@ -235,6 +246,22 @@ TEST_F(QpxiLibrary, ANewSessionSeesTheFileAsItIsNow) {
     EXPECT_EQ(chassis[0].getU32Attribute(zrqpxi::kChassisNumber), 4294967295u) << "the largest number passes whole";
     EXPECT_EQ(numbersOf(chassis[0].getSlots()), (std::vector<std::uint32_t>{0}));
     EXPECT_EQ(chassis[0].getStringAttribute(0x1001), 0u) << "no model: an empty text";
+}
+
+TEST_F(QpxiLibrary, ANewSessionSeesARewriteOfTheSameSizeAndModificationTime) {
+    const auto chassisNumber = [&] {
+        const zrqpxi::Session session(library);
+        return session.getChassis().at(0).getU32Attribute(zrqpxi::kChassisNumber);
+    };
+    sysroot.writeInventory(R"({"chassis": [{"number": 1}]})");
+    const auto modified = std::filesystem::last_write_time(sysroot.inventory());
+    EXPECT_EQ(chassisNumber(), 1u);
+    // Rewritten in place as a copy that keeps the times does, or twice within one clock tick.
+    for (const std::uint32_t number : {2u, 1u}) {
+        sysroot.writeInventory(R"({"chassis": [{"number": )" + std::to_string(number) + "}]}");
+        std::filesystem::last_write_time(sysroot.inventory(), modified);
+        EXPECT_EQ(chassisNumber(), number);
+    }
 }
 
 TEST_F(QpxiLibrary, NoInventoryFileIsAMachineWithoutChassis) {

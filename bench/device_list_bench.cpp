@@ -1,0 +1,156 @@
+// Building the list of local devices on simulated machines of 10, 100 and 1,000 timing modules in
+// PXI chassis: from no configuration file (enumeration, merge, save), and again with the file
+// already holding the result, which is then not written. The machines are laid out by the
+// project's command in a temporary folder, removed at the end.
+#include <benchmark/benchmark.h>
+#include <stdlib.h>
+#include <sys/stat.h>
+
+#include <cjson/cJSON.h>
+
+#include <chrono>
+#include <cstdint>
+#include <cstdlib>
+#include <cstring>
+#include <exception>
+#include <filesystem>
+#include <stdexcept>
+#include <string>
+#include <thread>
+#include <utility>
+
+#include "config/device_list.h"
+#include "config/lockable_file.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr int kSlotsPerChassis = 30;
+
+std::string joined(const std::string& list, const std::string& item) { return list.empty() ? item : list + "," + item; }
+
+// Modules in slots 1 to 30 of chassis 2, 4, 6 and so on: chassis N takes PCI buses N and N+1, so
+// chassis two apart share no bus.
+std::string layout(int modules) {
+    std::string chassis;
+    for (int placed = 0, number = 2; placed < modules; number += 2) {
+        std::string slots;
+        for (int slot = 1; slot <= kSlotsPerChassis && placed < modules; ++slot, ++placed)
+            slots = joined(slots, "\"" + std::to_string(slot) + "\":{}");
+        chassis = joined(chassis, "{\"number\":" + std::to_string(number) + ",\"slots\":{" + slots + "}}");
+    }
+    return "{\"chassis\":[" + chassis + "]}";
+}
+
+constexpr int kSizes[] = {10, 100, 1000};
+
+// One temporary folder holding a machine of each size, all laid out on first use and removed when
+// the program ends.
+class Machines {
+public:
+    ~Machines() {
+        std::error_code ignored;
+        if (!_base.empty()) fs::remove_all(_base, ignored);
+    }
+
+    // Points TIKTAL_SYSROOT at the machine of `modules` modules.
+    void use(int modules) {
+        if (_base.empty()) layOutAll();
+        ::setenv("TIKTAL_SYSROOT", (_base / std::to_string(modules)).c_str(), 1);
+    }
+
+private:
+    // The chassis query library trusts the times of its inventory file only once they are some
+    // seconds old (a file just written may change again within the same tick of the clock), and
+    // reads it again until then: the machines wait for that, as those in use are older.
+    void layOutAll() {
+        std::string pattern = (fs::temp_directory_path() / "tiktal-device-list-XXXXXX").string();
+        if (!::mkdtemp(pattern.data())) throw std::runtime_error("mkdtemp failed");
+        _base = pattern;
+        for (const int modules : kSizes) layOut(_base / std::to_string(modules), modules);
+        std::this_thread::sleep_for(std::chrono::seconds(3));
+    }
+
+    static void layOut(const fs::path& root, int modules) {
+        const std::string command =
+            std::string(TIKTAL_MACHINE) + " create " + root.string() + " '" + layout(modules) + "'";
+        if (std::system(command.c_str()) != 0) throw std::runtime_error("tiktal-machine failed: " + command);
+    }
+
+    fs::path _base;
+};
+
+Machines machines;
+
+bool hasPxiAlias(const zrjsonconfig::DeviceEntry& device) {
+    const cJSON* alias = cJSON_GetObjectItem(device.configured(), "alias");
+    return cJSON_IsString(alias) && std::strncmp(alias->valuestring, "PXI", 3) == 0;
+}
+
+// Every module is in the list with the alias of its chassis and slot, so the chassis query library
+// was loaded and asked for each of them.
+void checkList(benchmark::State& state, const zrjsonconfig::ConfigurationData& list) {
+    std::size_t located = 0;
+    for (const auto& entry : list.entries()) located += hasPxiAlias(*entry.second);
+    if (list.entries().size() != static_cast<std::size_t>(state.range(0)) || located != list.entries().size())
+        state.SkipWithError("the list does not hold every module with its PXI alias");
+}
+
+// The file is written by replacing it, so a write gives it another inode.
+std::pair<ino_t, std::int64_t> identityOf(const std::string& path) {
+    struct stat status {};
+    if (::stat(path.c_str(), &status) != 0) return {};
+    return {status.st_ino, std::int64_t{status.st_mtim.tv_sec} * 1000000000 + status.st_mtim.tv_nsec};
+}
+
+// Runs `body`; a failure ends the benchmark with its text instead of the program.
+template <class Body>
+void guarded(benchmark::State& state, Body&& body) {
+    try {
+        machines.use(static_cast<int>(state.range(0)));
+        body();
+    } catch (const std::exception& failure) {
+        state.SkipWithError(failure.what());
+    }
+    state.SetComplexityN(state.range(0));
+}
+
+void DeviceListFromScratch(benchmark::State& state) {
+    guarded(state, [&] {
+        const std::string file = zrjsonconfig::configFilePath();
+        zrjsonconfig::ConfigurationData list;
+        for (auto _ : state) {
+            state.PauseTiming();
+            fs::remove(file);
+            state.ResumeTiming();
+            list = tiktalsae::loadDeviceList();
+        }
+        checkList(state, list);
+    });
+}
+
+void DeviceListUnchanged(benchmark::State& state) {
+    guarded(state, [&] {
+        const std::string file = zrjsonconfig::configFilePath();
+        fs::remove(file);
+        tiktalsae::loadDeviceList();
+        const auto written = identityOf(file);
+        zrjsonconfig::ConfigurationData list;
+        for (auto _ : state) list = tiktalsae::loadDeviceList();
+        checkList(state, list);
+        if (identityOf(file) != written) state.SkipWithError("the unchanged list was written again");
+    });
+}
+
+void sizes(benchmark::internal::Benchmark* bench) {
+    for (const int modules : kSizes) bench->Arg(modules);
+    bench->Unit(benchmark::kMillisecond)->UseRealTime()->Complexity();
+}
+
+BENCHMARK(DeviceListFromScratch)->Apply(sizes);
+BENCHMARK(DeviceListUnchanged)->Apply(sizes);
+
+}  // namespace
+
+BENCHMARK_MAIN();
