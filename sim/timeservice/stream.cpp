@@ -28,9 +28,12 @@ public:
     // Hands the piece that starts at `offset` to the connection; false when it did not take it.
     bool send(unsigned long long offset, httplib::DataSink& sink, StreamCounters& counters) const {
         const std::size_t length = static_cast<std::size_t>(std::min<unsigned long long>(kPiece, _size - offset));
-        if (!sink.write(_block.data() + offset % _period, length)) return false;
+        // Counted before the client can have it, so that a client that has read the whole body
+        // finds it counted; taken back when the connection did not take it.
         counters.bytes += static_cast<long long>(length);
-        return true;
+        if (sink.write(_block.data() + offset % _period, length)) return true;
+        counters.bytes -= static_cast<long long>(length);
+        return false;
     }
 
 private:
