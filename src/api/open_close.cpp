@@ -1,5 +1,6 @@
 // Opening and closing sessions.
 #include "api/frame.h"
+#include "factory/session_factory.h"
 
 namespace {
 

@@ -1,0 +1,259 @@
+// Local devices through the C interface, on a simulated machine with its stand-ins running: the
+// machine command lays out the modules, a driver stand-in serves each module's interface path, the
+// routing service and the PXI chassis query are the stand-in libraries (found by LD_LIBRARY_PATH,
+// loaded here too so that the test reads their logs).
+#include <dlfcn.h>
+
+#include <gtest/gtest.h>
+#include <tiktal/tiktal.h>
+
+#include <cmath>
+#include <cstdlib>
+#include <fstream>
+#include <limits>
+#include <memory>
+#include <string>
+
+#include "child_process.h"
+#include "device_daemon.h"
+#include "stderr_capture.h"
+
+namespace {
+
+constexpr std::uint32_t kReadTerminalValue = 0x80012008;
+constexpr std::uint32_t kResetDevice = 0x80022004;
+
+// A stand-in library loaded by its bare name, which the driver's own load then shares.
+class StandIn {
+public:
+    explicit StandIn(const char* name) : _library(dlopen(name, RTLD_NOW | RTLD_LOCAL)) {}
+    ~StandIn() {
+        if (_library) dlclose(_library);
+    }
+    template <class Fn>
+    Fn entry(const char* name) const {
+        return reinterpret_cast<Fn>(_library ? dlsym(_library, name) : nullptr);
+    }
+
+private:
+    void* _library;
+};
+
+// The machine: chassis 1 holds modules in slots 2 (serial 1a2b) and 4 (0x7406), chassis 3 a
+// module of another kind in slot 5. Daemons serve the modules of chassis 1.
+class LocalDevices : public ::testing::Test {
+protected:
+    LocalDevices() : _root(tiktaltest::makeTemporaryFolder("tiktal-local")) {
+        ::setenv("TIKTAL_SYSROOT", _root.c_str(), 1);
+        machine("create " + _root +
+                R"( '{"chassis":[{"number":1,"slots":{"2":{"serial":"1a2b"},"4":{"device":"0x7406"}}},)"
+                R"({"number":3,"slots":{"5":{"device":"0x7407"}}}]}')");
+        slot2 = std::make_unique<DeviceDaemon>(_root + "/dev/tiktal0");
+        slot4 = std::make_unique<DeviceDaemon>(_root + "/dev/tiktal1");
+    }
+    ~LocalDevices() override {
+        for (ViSession vi : _open) tiktal_close(vi);
+        slot2.reset();
+        slot4.reset();
+        ::unsetenv("TIKTAL_SYSROOT");
+        tiktaltest::removeFolder(_root);
+    }
+
+    void machine(const std::string& arguments) {
+        const std::string command = std::string(TIKTAL_MACHINE) + " " + arguments + " > /dev/null";
+        ASSERT_EQ(std::system(command.c_str()), 0) << command;
+    }
+    // Opens `name`; 0 when that fails, with the status in `status`.
+    ViSession open(const char* name, ViBoolean reset = VI_FALSE) {
+        ViSession vi = 0;
+        status = tiktal_init(const_cast<ViRsrc>(name), VI_FALSE, reset, &vi);
+        if (status == VI_SUCCESS) _open.push_back(vi);
+        return status == VI_SUCCESS ? vi : 0;
+    }
+    ViInt32 int32(ViSession vi, ViAttr attribute) {
+        ViInt32 value = -1;
+        status = tiktal_GetAttributeViInt32(vi, "", attribute, &value);
+        return value;
+    }
+    // How many device lists were built so far: each build asks the chassis query about every
+    // module it finds, one query session each.
+    int chassisSessions() {
+        const auto log = chassis.entry<std::uint32_t (*)(char*, std::uint32_t)>("zrqpxi_sim_log");
+        std::string text(log(nullptr, 0), '\0');
+        log(text.data(), static_cast<std::uint32_t>(text.size()));
+        int sessions = 0;
+        for (std::size_t at = 0; (at = text.find("openPXISession(", at)) != std::string::npos; ++at) ++sessions;
+        return sessions;
+    }
+    std::string routingText(const char* entry, const char* argument = nullptr) {
+        using Text = char* (*)(const char*);
+        using Free = void (*)(char*);
+        char* text = argument || std::string(entry) == "zrrocoapi_sim_routes"
+                         ? routing.entry<Text>(entry)(argument)
+                         : routing.entry<char* (*)()>(entry)();
+        const std::string copy = text ? text : "";
+        routing.entry<Free>("zrrocoapi_destroyString")(text);
+        return copy;
+    }
+
+    std::string _root;
+    StandIn routing{"libzrrocoapi.so"};
+    StandIn chassis{"libzrqpxi.so"};
+    std::unique_ptr<DeviceDaemon> slot2, slot4;
+    std::vector<ViSession> _open;
+    ViStatus status = VI_SUCCESS;
+};
+
+TEST_F(LocalDevices, ModulesOpenByAliasInAnyCaseAndByTheirPciAddress) {
+    const ViSession byAlias = open("pxi1slot2");
+    ASSERT_EQ(status, VI_SUCCESS);
+    EXPECT_EQ(int32(byAlias, 1150001), 6699) << "serial number 1a2b";
+    EXPECT_EQ(int32(byAlias, 1150002), 0x7405);
+    // Chassis 1's slots are devices of bus 2.
+    for (const char* name : {"PXI0::2-2.0::INSTR", "pxi0::2-2::instr", "PCI0::2-2.0", "PXI2::2::INSTR", "PXI2::2::0::INSTR"}) {
+        const ViSession vi = open(name);
+        ASSERT_EQ(status, VI_SUCCESS) << name;
+        EXPECT_EQ(int32(vi, 1150002), 0x7405) << name;
+    }
+    EXPECT_EQ(int32(open("PXI0::2-4.0::INSTR"), 1150002), 0x7406);
+    // Names that are no address of a module here, or no address at all.
+    for (const char* name : {"PXI1::2-2.0::INSTR", "PXI0::2-2.1::INSTR", "PXI0::256-2.0::INSTR", "PXI0::2-32.0::INSTR",
+                             "PXI0::2-2.8::INSTR", "PXI0::MEMACC", "PXI0::1::BACKPLANE", "PXI0::CHASSIS1::SLOT2",
+                             "PXI0::CHASSIS1::SLOT2::FUNC0::INSTR", "PXI0::99999999999-2.0::INSTR", "PXI1Slot2 ", ""}) {
+        EXPECT_EQ(open(name), 0u) << name;
+        EXPECT_EQ(status, tiktalerr_deviceNotFound) << name;
+    }
+}
+
+TEST_F(LocalDevices, TerminalValuesGoToTheDriverInThousandths) {
+    const ViSession vi = open("PXI1Slot2");
+    ASSERT_EQ(status, VI_SUCCESS);
+    EXPECT_EQ(tiktal_SetAttributeViReal64(vi, "", 1150100, 2.5), VI_SUCCESS);
+    EXPECT_EQ(tiktal_SetAttributeViReal64(vi, "ignored", 1150105, 4294967.295), VI_SUCCESS);
+    EXPECT_EQ(slot2->terminalValues(), (std::map<std::uint32_t, std::uint32_t>{{58, 2500}, {93, 4294967295u}}));
+    ViReal64 value = 0;
+    EXPECT_EQ(tiktal_GetAttributeViReal64(vi, "", 1150100, &value), VI_SUCCESS);
+    EXPECT_EQ(value, 2.5);
+    EXPECT_EQ(tiktal_GetAttributeViReal64(vi, "", 1150105, &value), VI_SUCCESS);
+    EXPECT_EQ(value, 4294967.295) << "the count is unsigned";
+
+    // Values without a count are refused and nothing is sent; so are other attributes.
+    slot2->clearPackets();
+    for (const double bad : {-0.001, std::nan(""), std::numeric_limits<double>::infinity(), 4294967.296})
+        EXPECT_EQ(tiktal_SetAttributeViReal64(vi, "", 1150101, bad), tiktalerr_invParameter) << bad;
+    EXPECT_EQ(tiktal_SetAttributeViReal64(vi, "", 1150106, 1.0), tiktalerr_nsupAttr);
+    EXPECT_EQ(tiktal_GetAttributeViReal64(vi, "", 1150106, &value), tiktalerr_nsupAttr);
+    EXPECT_EQ(tiktal_GetAttributeViReal64(vi, "", 1150099, &value), tiktalerr_nsupAttr);
+    EXPECT_EQ(tiktal_GetAttributeViInt32(vi, "", 1150003, nullptr), tiktalerr_invParameter) << "null comes first";
+    EXPECT_EQ(tiktal_GetAttributeViReal64(vi, "", 1150100, nullptr), tiktalerr_invParameter);
+    EXPECT_TRUE(slot2->packets().empty());
+
+    // A failed request reaches the caller with the driver's status.
+    slot2->failNext(kReadTerminalValue, -52008);
+    EXPECT_EQ(tiktal_GetAttributeViReal64(vi, "", 1150100, &value), -52008);
+}
+
+TEST_F(LocalDevices, RoutesAreMadeAndRemovedByTheRoutingService) {
+    const ViSession vi = open("PXI1Slot4");
+    ASSERT_EQ(status, VI_SUCCESS);
+    EXPECT_EQ(tiktal_ConnectTrigTerminals(vi, "PFI0", "PXI_Trig3", "", 0, 0), VI_SUCCESS);
+    EXPECT_NE(routingText("zrrocoapi_sim_routes", "PXI1Slot4").find("/PXI1Slot4/PXI_Trig3"), std::string::npos);
+    EXPECT_EQ(tiktal_DisconnectTrigTerminals(vi, "PFI0", "AllConnected"), VI_SUCCESS);
+    EXPECT_EQ(routingText("zrrocoapi_sim_routes", "PXI1Slot4"), "[]");
+    EXPECT_EQ(tiktal_ConnectClkTerminals(vi, "ClkIn", "PXI_Clk10"), VI_SUCCESS);
+    EXPECT_NE(routingText("zrrocoapi_sim_routes", "PXI1Slot4").find("/PXI1Slot4/PXI_Clk10_In"), std::string::npos);
+    tiktal_close(vi);
+    _open.clear();
+    EXPECT_EQ(routingText("zrrocoapi_sim_routes", "PXI1Slot4"), "[]") << "closing ends the routing session";
+}
+
+TEST_F(LocalDevices, ResetGoesThroughTheRoutingServiceAndTheDriver) {
+    routing.entry<void (*)()>("zrrocoapi_sim_reset")();
+    const ViSession vi = open("PXI1Slot2", VI_TRUE);
+    ASSERT_EQ(status, VI_SUCCESS);
+    const auto calls = [&] {
+        std::string names;
+        const std::string log = routingText("zrrocoapi_sim_log");
+        for (const char* call : {"initiateDeviceReset", "completeDeviceReset", "destroySession"})
+            for (std::size_t at = 0; (at = log.find(std::string("\"") + call + "\"", at)) != std::string::npos; ++at)
+                names += std::string(call) + " ";
+        return names;
+    };
+    EXPECT_EQ(calls(), "initiateDeviceReset completeDeviceReset destroySession ");
+    EXPECT_EQ(slot2->packets().back().code, kResetDevice);
+
+    // A failed device reset is not completed, and its routing session still ends.
+    routing.entry<void (*)()>("zrrocoapi_sim_reset")();
+    slot2->failNext(kResetDevice, -52008);
+    EXPECT_EQ(tiktal_reset(vi), -52008);
+    EXPECT_EQ(calls(), "initiateDeviceReset destroySession ");
+}
+
+TEST_F(LocalDevices, TheListIsRebuiltOnlyWhenALookupMissesIt) {
+    ASSERT_NE(open("PXI1Slot2"), 0u);
+    const int oneBuild = chassisSessions();
+    ASSERT_GT(oneBuild, 0);
+
+    // A present module of another kind: no rebuild.
+    EXPECT_EQ(open("PXI3Slot5"), 0u);
+    EXPECT_EQ(status, tiktalerr_deviceNotFound);
+    EXPECT_EQ(chassisSessions(), oneBuild);
+    // A name no device has: exactly one rebuild.
+    EXPECT_EQ(open("NoSuchDevice"), 0u);
+    EXPECT_EQ(status, tiktalerr_deviceNotFound);
+    const int twoBuilds = chassisSessions();
+    EXPECT_GT(twoBuilds, oneBuild);
+    const int perBuild = twoBuilds - oneBuild;
+
+    // A module added since is found after one rebuild, which locates the four modules and gives
+    // the new one its alias.
+    machine("add " + _root + " 1 7");
+    EXPECT_EQ(open("PXI1Slot7"), 0u) << "its driver is not running";
+    EXPECT_NE(status, VI_SUCCESS);
+    EXPECT_EQ(chassisSessions(), twoBuilds + 4 + 1);
+
+    // A module removed stays in the cached list until a lookup misses it.
+    machine("remove " + _root + " tiktal1");
+    EXPECT_NE(open("PXI1Slot4"), 0u) << "its driver still runs";
+    EXPECT_EQ(open("NoSuchDevice"), 0u);
+    EXPECT_EQ(open("PXI0::2-4.0::INSTR"), 0u);
+    EXPECT_EQ(status, tiktalerr_deviceNotFound);
+}
+
+TEST_F(LocalDevices, AnAbsentModuleCostsOneRebuildAndASimulatedDeviceTraces) {
+    slot4.reset();
+    machine("remove " + _root + " tiktal1");
+    ASSERT_NE(open("PXI1Slot2"), 0u);
+    // The list of the next call has slot 4 absent, and so does the one it rebuilds.
+    const int before = chassisSessions();
+    EXPECT_EQ(open("PXI1Slot4"), 0u);
+    EXPECT_EQ(status, tiktalerr_deviceNotFound);
+    EXPECT_GT(chassisSessions(), before);
+
+    std::ofstream(_root + "/var/lib/Korvane/tiktal/board1.fake")
+        << R"({"serialNumber":"5eed","pciDeviceID":29701,"pciSubsystemID":1,"pciBusNumber":200,"pciDeviceNumber":0,)"
+           R"("pciFunctionNumber":0,"pcieLinkWidth":1,"pcieMaxLinkWidth":1,"pciRevision":1,"pcieTransferRate":1,)"
+           R"("pcieMaxTransferRate":1})";
+    testsupport::StderrCapture trace;
+    const ViSession simulated = open("Sync1");
+    ASSERT_EQ(status, VI_SUCCESS) << "the simulated device's numbered alias";
+    ViReal64 value = 0;
+    EXPECT_EQ(tiktal_SetAttributeViReal64(simulated, "", 1150100, 2.5), VI_SUCCESS);
+    EXPECT_EQ(tiktal_GetAttributeViReal64(simulated, "", 1150106, &value), VI_SUCCESS);
+    EXPECT_NE(open("PXI0::200-0.0::INSTR"), 0u) << "by its address too";
+    std::string lines;
+    for (const std::string& write : trace.finish()) lines += write;
+    EXPECT_NE(lines.find("tiktal::SessionDebugPrintOnly::setAttributeViReal64"), std::string::npos) << lines;
+}
+
+TEST_F(LocalDevices, AModuleWhoseDriverIsNotRunningFailsAtOnce) {
+    slot4->kill();  // its socket stays behind, with no one listening
+    EXPECT_EQ(open("PXI1Slot4"), 0u);
+    EXPECT_NE(status, VI_SUCCESS);
+    EXPECT_LT(status, 0);
+    slot4.reset();
+    EXPECT_EQ(open("PXI1Slot4"), 0u) << "and without a socket";
+    EXPECT_LT(status, 0);
+}
+
+}  // namespace
