@@ -21,67 +21,14 @@
 
 #include "config/device_list.h"
 #include "config/lockable_file.h"
+#include "simulated_machines.h"
 
 namespace {
 
 namespace fs = std::filesystem;
 
-constexpr int kSlotsPerChassis = 30;
-
-std::string joined(const std::string& list, const std::string& item) { return list.empty() ? item : list + "," + item; }
-
-// Modules in slots 1 to 30 of chassis 2, 4, 6 and so on: chassis N takes PCI buses N and N+1, so
-// chassis two apart share no bus.
-std::string layout(int modules) {
-    std::string chassis;
-    for (int placed = 0, number = 2; placed < modules; number += 2) {
-        std::string slots;
-        for (int slot = 1; slot <= kSlotsPerChassis && placed < modules; ++slot, ++placed)
-            slots = joined(slots, "\"" + std::to_string(slot) + "\":{}");
-        chassis = joined(chassis, "{\"number\":" + std::to_string(number) + ",\"slots\":{" + slots + "}}");
-    }
-    return "{\"chassis\":[" + chassis + "]}";
-}
-
 constexpr int kSizes[] = {10, 100, 1000};
-
-// One temporary folder holding a machine of each size, all laid out on first use and removed when
-// the program ends.
-class Machines {
-public:
-    ~Machines() {
-        std::error_code ignored;
-        if (!_base.empty()) fs::remove_all(_base, ignored);
-    }
-
-    // Points TIKTAL_SYSROOT at the machine of `modules` modules.
-    void use(int modules) {
-        if (_base.empty()) layOutAll();
-        ::setenv("TIKTAL_SYSROOT", (_base / std::to_string(modules)).c_str(), 1);
-    }
-
-private:
-    // The chassis query library trusts the times of its inventory file only once they are some
-    // seconds old (a file just written may change again within the same tick of the clock), and
-    // reads it again until then: the machines wait for that, as those in use are older.
-    void layOutAll() {
-        std::string pattern = (fs::temp_directory_path() / "tiktal-device-list-XXXXXX").string();
-        if (!::mkdtemp(pattern.data())) throw std::runtime_error("mkdtemp failed");
-        _base = pattern;
-        for (const int modules : kSizes) layOut(_base / std::to_string(modules), modules);
-        std::this_thread::sleep_for(std::chrono::seconds(3));
-    }
-
-    static void layOut(const fs::path& root, int modules) {
-        const std::string command =
-            std::string(TIKTAL_MACHINE) + " create " + root.string() + " '" + layout(modules) + "'";
-        if (std::system(command.c_str()) != 0) throw std::runtime_error("tiktal-machine failed: " + command);
-    }
-
-    fs::path _base;
-};
-
-Machines machines;
+benchsupport::Machines machines(kSizes);
 
 bool hasPxiAlias(const zrjsonconfig::DeviceEntry& device) {
     const cJSON* alias = cJSON_GetObjectItem(device.configured(), "alias");
