@@ -1,9 +1,4 @@
-// Local devices through the C interface, on a simulated machine with its stand-ins running: the
-// machine command lays out the modules, a driver stand-in serves each module's interface path, the
-// routing service and the PXI chassis query are the stand-in libraries (found by LD_LIBRARY_PATH,
-// loaded here too so that the test reads their logs).
-#include <dlfcn.h>
-
+// Local devices through the C interface, on a simulated machine with its stand-ins running.
 #include <gtest/gtest.h>
 #include <tiktal/tiktal.h>
 
@@ -14,8 +9,7 @@
 #include <memory>
 #include <string>
 
-#include "child_process.h"
-#include "device_daemon.h"
+#include "local_machine.h"
 #include "stderr_capture.h"
 
 namespace {
@@ -23,46 +17,12 @@ namespace {
 constexpr std::uint32_t kReadTerminalValue = 0x80012008;
 constexpr std::uint32_t kResetDevice = 0x80022004;
 
-// A stand-in library loaded by its bare name, which the driver's own load then shares.
-class StandIn {
-public:
-    explicit StandIn(const char* name) : _library(dlopen(name, RTLD_NOW | RTLD_LOCAL)) {}
-    ~StandIn() {
-        if (_library) dlclose(_library);
-    }
-    template <class Fn>
-    Fn entry(const char* name) const {
-        return reinterpret_cast<Fn>(_library ? dlsym(_library, name) : nullptr);
-    }
-
-private:
-    void* _library;
-};
-
-// The machine: chassis 1 holds modules in slots 2 (serial 1a2b) and 4 (0x7406), chassis 3 a
-// module of another kind in slot 5. Daemons serve the modules of chassis 1.
-class LocalDevices : public ::testing::Test {
+class LocalDevices : public ::testing::Test, protected localmachine::LocalMachine {
 protected:
-    LocalDevices() : _root(tiktaltest::makeTemporaryFolder("tiktal-local")) {
-        ::setenv("TIKTAL_SYSROOT", _root.c_str(), 1);
-        machine("create " + _root +
-                R"( '{"chassis":[{"number":1,"slots":{"2":{"serial":"1a2b"},"4":{"device":"0x7406"}}},)"
-                R"({"number":3,"slots":{"5":{"device":"0x7407"}}}]}')");
-        slot2 = std::make_unique<DeviceDaemon>(_root + "/dev/tiktal0");
-        slot4 = std::make_unique<DeviceDaemon>(_root + "/dev/tiktal1");
-    }
     ~LocalDevices() override {
         for (ViSession vi : _open) tiktal_close(vi);
-        slot2.reset();
-        slot4.reset();
-        ::unsetenv("TIKTAL_SYSROOT");
-        tiktaltest::removeFolder(_root);
     }
 
-    void machine(const std::string& arguments) {
-        const std::string command = std::string(TIKTAL_MACHINE) + " " + arguments + " > /dev/null";
-        ASSERT_EQ(std::system(command.c_str()), 0) << command;
-    }
     // Opens `name`; 0 when that fails, with the status in `status`.
     ViSession open(const char* name, ViBoolean reset = VI_FALSE) {
         ViSession vi = 0;
@@ -96,10 +56,6 @@ protected:
         return copy;
     }
 
-    std::string _root;
-    StandIn routing{"libzrrocoapi.so"};
-    StandIn chassis{"libzrqpxi.so"};
-    std::unique_ptr<DeviceDaemon> slot2, slot4;
     std::vector<ViSession> _open;
     ViStatus status = VI_SUCCESS;
 };
@@ -230,7 +186,7 @@ TEST_F(LocalDevices, AnAbsentModuleCostsOneRebuildAndASimulatedDeviceTraces) {
     EXPECT_EQ(status, tiktalerr_deviceNotFound);
     EXPECT_GT(chassisSessions(), before);
 
-    std::ofstream(_root + "/var/lib/Korvane/tiktal/board1.fake")
+    std::ofstream(dataDirectory() + "/board1.fake")
         << R"({"serialNumber":"5eed","pciDeviceID":29701,"pciSubsystemID":1,"pciBusNumber":200,"pciDeviceNumber":0,)"
            R"("pciFunctionNumber":0,"pcieLinkWidth":1,"pcieMaxLinkWidth":1,"pciRevision":1,"pcieTransferRate":1,)"
            R"("pcieMaxTransferRate":1})";
