@@ -1,5 +1,6 @@
 // The list of local devices: the configuration file's devices merged, under the file's lock, with
-// the timing modules present now, each with the attributes of the driver's provider.
+// the timing modules present now and the simulated devices of the data directory (in that order),
+// each with the attributes of the driver's provider.
 #pragma once
 
 #include "config/configuration_data.h"

@@ -272,16 +272,74 @@ int readWhole(int descriptor, std::size_t limit, std::string& text) {
     }
 }
 
-// The names in a folder, sorted, without "." and ".."; 0 or the error number.
-int listFolder(const std::string& path, std::vector<std::string>& names) {
-    names.clear();
+// Whether the entry `name` of the open folder is a regular file, the link itself for a link.
+bool isRegularFile(DIR* folder, const dirent* entry) {
+    if (entry->d_type != DT_UNKNOWN) return entry->d_type == DT_REG;
+    struct stat status {};
+    return ::fstatat(::dirfd(folder), entry->d_name, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
+}
+
+int readFolder(DIR* folder, std::vector<DirectoryEntry>& entries) {
+    for (;;) {
+        errno = 0;
+        const dirent* entry = ::readdir(folder);
+        if (!entry) return errno;
+        if (std::strcmp(entry->d_name, ".") != 0 && std::strcmp(entry->d_name, "..") != 0)
+            entries.push_back({entry->d_name, isRegularFile(folder, entry)});
+    }
+}
+
+}  // namespace
+
+int listDirectory(const std::string& path, std::vector<DirectoryEntry>& entries) noexcept {
+    entries.clear();
     DIR* folder = ::opendir(path.c_str());
     if (!folder) return errno;
-    while (const dirent* entry = ::readdir(folder))
-        if (std::strcmp(entry->d_name, ".") != 0 && std::strcmp(entry->d_name, "..") != 0) names.push_back(entry->d_name);
+    int error = 0;
+    try {
+        error = readFolder(folder, entries);
+        std::sort(entries.begin(), entries.end(),
+                  [](const DirectoryEntry& a, const DirectoryEntry& b) { return a.name < b.name; });
+    } catch (const std::bad_alloc&) {
+        error = ENOMEM;
+    }
     ::closedir(folder);
-    std::sort(names.begin(), names.end());
-    return 0;
+    if (error) entries.clear();
+    return error;
+}
+
+OsError readRegularFile(const std::string& path, std::size_t limit, std::string& text) noexcept {
+    text.clear();
+    // Without blocking: a pipe or a terminal put in the file's place must not hold the reader up
+    // before it is refused.
+    const int file = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY);
+    if (file < 0) return {"open", errno == ELOOP ? ENOENT : errno};  // ELOOP: the path is a link
+    OsError error;
+    struct stat status {};
+    if (::fstat(file, &status) != 0) {
+        error = {"fstat", errno};
+    } else if (!S_ISREG(status.st_mode)) {
+        error = {"open", ENOENT};
+    } else {
+        try {
+            if (const int failed = readWhole(file, limit, text)) error = {"pread", failed};
+        } catch (const std::bad_alloc&) {
+            error = {"pread", ENOMEM};
+        }
+    }
+    ::close(file);
+    return error;
+}
+
+namespace {
+
+// The names in a folder, sorted, without "." and ".."; 0 or the error number.
+int listFolder(const std::string& path, std::vector<std::string>& names) {
+    std::vector<DirectoryEntry> entries;
+    const int error = listDirectory(path, entries);
+    names.clear();
+    for (DirectoryEntry& entry : entries) names.push_back(std::move(entry.name));
+    return error;
 }
 
 // Removes the temporary files that writers of `name` in `folder` left when they were killed before
@@ -553,16 +611,7 @@ bool exists(const std::string& path) noexcept {
 }
 
 int readAttributeFile(const std::string& path, std::string& text) noexcept {
-    const int file = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
-    if (file < 0) return errno;
-    int error = 0;
-    try {
-        error = readWhole(file, 4096, text);
-    } catch (const std::bad_alloc&) {
-        error = ENOMEM;
-    }
-    ::close(file);
-    if (error) return error == EFBIG ? EOVERFLOW : error;
+    if (const OsError error = readRegularFile(path, 4096, text)) return error.code == EFBIG ? EOVERFLOW : error.code;
     while (!text.empty() && (text.back() == '\n' || text.back() == '\r')) text.pop_back();
     return 0;
 }

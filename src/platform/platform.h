@@ -70,8 +70,8 @@ struct DeviceInterfaceEntry {
 
 // The device interfaces present now, sorted by name; 0, or the error number of the failure.
 int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexcept;
-// The text of a small attribute file (at most 4 KiB), without its trailing line feed; 0 or the
-// error number (ENOENT for a missing file).
+// The text of a small attribute file (at most 4 KiB, else EOVERFLOW), without its trailing line
+// feed; 0 or the error number (ENOENT when no regular file is there, as readRegularFile says).
 int readAttributeFile(const std::string& path, std::string& text) noexcept;
 
 // Whether something (a file, a folder, a link) is at `path`.
@@ -90,6 +90,22 @@ struct OsError {
 
 // The system's message text of an error number.
 std::string osErrorText(int error);
+
+// One entry of a folder: its name, and whether the entry itself is a regular file (a symbolic
+// link is not followed, so it never counts as one).
+struct DirectoryEntry {
+    std::string name;
+    bool regularFile = false;
+};
+
+// The entries of the folder `path`, without "." and "..", sorted by name in byte order, so that
+// every file system gives the same order. 0, or the error number (ENOENT for a missing folder).
+int listDirectory(const std::string& path, std::vector<DirectoryEntry>& entries) noexcept;
+
+// The whole content of the regular file at `path`; a symbolic link is not followed. ENOENT when
+// no regular file is there (nothing, a link, a folder, a device), EFBIG when the file is longer
+// than `limit` bytes (nothing is kept), else the error number of the call that failed.
+OsError readRegularFile(const std::string& path, std::size_t limit, std::string& text) noexcept;
 
 // The driver's data directory: $TIKTAL_SYSROOT/var/lib/Korvane/tiktal.
 std::string dataDirectory();
