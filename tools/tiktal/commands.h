@@ -15,6 +15,12 @@ struct Options {
     std::string code;  // status code of `status`
     bool reset = false;
     bool json = false;
+    // route and unroute
+    std::string source;
+    std::string destination;
+    bool clock = false;
+    bool invert = false;
+    std::string syncClock;  // --sync-clock, or "" (the default synchronization)
 };
 
 void openCommand(const Options& options);
@@ -24,5 +30,11 @@ void refsCommand(const Options& options);
 void timeCommand(const Options& options);
 void persistCommand(const Options& options);
 void statusCommand(const Options& options);
+
+// Local devices (local_commands.cpp).
+void devicesCommand(const Options& options);
+void routeCommand(const Options& options);
+void unrouteCommand(const Options& options);
+void resetCommand(const Options& options);
 
 }  // namespace cli

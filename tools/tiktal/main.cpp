@@ -39,7 +39,8 @@ CLI::App* addCommand(CLI::App& app, Options& options, const char* name, const ch
 }
 
 void addResource(CLI::App* command, Options& options) {
-    command->add_option("RESOURCE", options.resource, "SyncTestInternal___, sync://HOST[:PORT]/DEVICE or device alias")
+    command->add_option("RESOURCE", options.resource,
+                        "SyncTestInternal___, sync://HOST[:PORT]/DEVICE, a local device's alias or PXI resource name")
         ->required();
 }
 
@@ -98,6 +99,32 @@ int main(int argc, char** argv) {
         addResource(command, options);
         commands.emplace_back(command, run);
     }
+
+    CLI::App* devices = addCommand(app, options, "devices", "List the local devices: alias, presence, PCI and PXI location");
+    commands.emplace_back(devices, cli::devicesCommand);
+
+    using Run = void (*)(const Options&);
+    const std::tuple<const char*, const char*, Run> routing[] = {
+        {"route", "Connect two terminals of a timing module (for as long as the session lasts)", cli::routeCommand},
+        {"unroute", "Disconnect two terminals of a timing module (AllConnected: every route at that end)",
+         cli::unrouteCommand},
+    };
+    for (const auto& [name, description, run] : routing) {
+        CLI::App* command = addCommand(app, options, name, description);
+        command->add_option("DEVICE", options.resource, "Alias or PXI resource name of the module")->required();
+        command->add_option("SRC", options.source, "Source terminal (PFI0, ClkIn, ...)")->required();
+        command->add_option("DEST", options.destination, "Destination terminal (PXI_Trig0, PXI_Clk10, ...)")->required();
+        command->add_flag("--clock", options.clock, "A clock route instead of a trigger route");
+        if (run == cli::routeCommand) {
+            command->add_flag("--invert", options.invert, "Invert the trigger");
+            command->add_option("--sync-clock", options.syncClock, "Synchronization clock (\"\" or SyncClkAsync)");
+        }
+        commands.emplace_back(command, run);
+    }
+
+    CLI::App* reset = addCommand(app, options, "reset", "Reset a device");
+    reset->add_option("DEVICE", options.resource, "Alias or PXI resource name")->required();
+    commands.emplace_back(reset, cli::resetCommand);
 
     CLI::App* status = addCommand(app, options, "status", "Explain a status code");
     status->add_option("CODE", options.code, "Status in hex (0xBFFA4003) or decimal, signed or unsigned")->required();
