@@ -2,8 +2,10 @@
 call-tracing session and against the time-service simulator running as a separate process.
 
 Environment: TIKTAL_COMMAND (the program), TIMESERVICE_SIM (the simulator), TIKTAL_STATUS_TABLE
-(src/tables/statuses.tsv, where the expected messages come from), ZRSHAREDDIR for the library.
-Arguments select test classes, as for unittest.
+(src/tables/statuses.tsv, where the expected messages come from), ZRSHAREDDIR for the library;
+for local devices TIKTAL_MACHINE (the machine command) and TIKTAL_DEVD (the driver stand-in), with
+the routing and chassis-query stand-ins on LD_LIBRARY_PATH. Arguments select test classes, as for
+unittest.
 """
 import datetime
 import json
@@ -322,6 +324,64 @@ class SimulatorTest(CommandTest):
                          "tiktal_GetAttributeViString")
 
 
+FEATURE_NOT_SUPPORTED = 0xBFFA4003  # what a timing module says to a route it never makes
+
+
+class LocalDevicesTest(CommandTest):
+    """Timing modules and a simulated device of a machine laid out by the machine command, with a
+    driver stand-in on each module's interface path."""
+
+    def setUp(self):
+        self.folder = tempfile.TemporaryDirectory()
+        self.root = self.folder.name
+        self.saved = os.environ.get("TIKTAL_SYSROOT")
+        os.environ["TIKTAL_SYSROOT"] = self.root
+        self.machine("create", self.root, '{"chassis":[{"number":1,"slots":{"2":{"serial":"c0ffee"},"4":{"device":"0x7406"}}}]}')
+        self.machine("fake", self.root, "board1")
+        self.machine("start-daemons", self.root)
+
+    def tearDown(self):
+        self.machine("stop-daemons", self.root)
+        os.environ["TIKTAL_SYSROOT"] = self.saved
+        self.folder.cleanup()
+
+    def machine(self, *args):
+        subprocess.run([os.environ["TIKTAL_MACHINE"], *args], check=True, stdout=subprocess.DEVNULL,
+                       stderr=subprocess.DEVNULL, timeout=60)
+
+    def test_devices_in_both_forms(self):
+        lines = self.succeed("devices").splitlines()
+        self.assertEqual(lines[0].split(), ["ALIAS", "PRESENT", "SIMULATED", "PCI", "PXI", "DEVICE", "SERIAL", "TOKEN"])
+        self.assertEqual([line.split()[:7] for line in lines[1:]], [
+            ["Sync1", "yes", "no", "255:0.0", "-", "0x7405", "5eed0001"],
+            ["PXI1Slot2", "yes", "no", "2:2.0", "1/2", "0x7405", "c0ffee"],
+            ["PXI1Slot4", "yes", "no", "2:4.0", "1/4", "0x7406", "1a2b0002"]])
+        devices = self.succeed_json("devices")
+        self.assertEqual([device["token"] for device in devices][0], "FAKE:TIKTAL:board1")
+        module = devices[1]
+        self.assertEqual((module["alias"], module["is_present"], module["pxi_chassis_number"], module["pci_bus"],
+                          module["interface_path"]), ("PXI1Slot2", True, 1, 2, self.root + "/dev/tiktal0"))
+
+    def test_routes_terminal_values_and_reset(self):
+        self.assertEqual(self.succeed("route", "pxi1slot2", "PFI0", "PXI_Trig3", "--invert"),
+                         "routed PFI0 -> PXI_Trig3 on pxi1slot2\n")
+        self.assertEqual(self.succeed("unroute", "PXI1Slot2", "PFI0", "AllConnected"),
+                         "unrouted PFI0 -> AllConnected on PXI1Slot2\n")
+        self.assertEqual(self.succeed_json("route", "PXI0::2-4.0::INSTR", "ClkIn", "PXI_Clk10", "--clock"),
+                         {"resource": "PXI0::2-4.0::INSTR", "routed": "ClkIn -> PXI_Clk10", "clock": True})
+        # A source the module refuses for a trigger route, and a device that is not there.
+        self.assertEqual(self.fail_call(FEATURE_NOT_SUPPORTED, "route", "PXI1Slot2", "ClkIn", "PXI_Trig0"),
+                         "tiktal_ConnectTrigTerminals")
+        self.assertEqual(self.fail_call(0xBFFA4016, "reset", "PXI9Slot9"), "tiktal_init")
+
+        self.succeed("set", "PXI1Slot2", "TERMINAL_58_VALUE", "2.5")
+        self.assertEqual(self.succeed("get", "PXI2::2::INSTR", "TERMINAL_58_VALUE"), "TIKTAL_ATTR_TERMINAL_58_VALUE = 2.5\n")
+        self.assertEqual(self.succeed("get", "PXI1Slot2", "SERIAL_NUMBER"), f"TIKTAL_ATTR_SERIAL_NUMBER = {0xc0ffee}\n")
+        self.assertEqual(self.succeed("reset", "PXI1Slot2"), "reset: PXI1Slot2\n")
+        self.assertEqual(self.succeed("get", "PXI1Slot2", "TERMINAL_58_VALUE"), "TIKTAL_ATTR_TERMINAL_58_VALUE = 0\n")
+        self.assertIn("Self test passed", self.succeed("open", "Sync1"))
+
+
 class UsageTest(CommandTest):
     """What needs no session: status codes, help, and the command line itself."""
 
@@ -342,7 +402,8 @@ class UsageTest(CommandTest):
 
     def test_help_of_the_command_and_every_subcommand(self):
         self.assertIn("Usage: tiktal [OPTIONS] SUBCOMMAND", self.succeed("--help"))
-        for command in ["open", "get", "set", "refs", "time", "persist", "status"]:
+        for command in ["open", "get", "set", "refs", "time", "persist", "status", "devices", "route", "unroute",
+                        "reset"]:
             with self.subTest(command=command):
                 text = self.succeed(command, "--help")
                 self.assertIn(f"Usage: tiktal {command} ", text)
