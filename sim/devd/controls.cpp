@@ -2,6 +2,8 @@
 
 #include <cjson/cJSON.h>
 
+#include "deviceRequests.h"
+
 #include <cmath>
 #include <functional>
 #include <map>
@@ -53,6 +55,8 @@ Json packets(Daemon& daemon) {
     for (const RecordedPacket& packet : daemon.record.all()) {
         cJSON* item = cJSON_CreateObject();
         cJSON_AddNumberToObject(item, "code", packet.code);
+        for (const auto& request : tiktalq300::requests::kRequests)
+            if (request.code == packet.code) cJSON_AddStringToObject(item, "request", request.name);
         cJSON_AddNumberToObject(item, "outputSize", packet.outputSize);
         cJSON_AddItemToObject(item, "input", cJSON_CreateString(hex(packet.input).c_str()));
         cJSON_AddItemToArray(list.get(), item);
