@@ -72,6 +72,10 @@ TEST_F(LocalDevices, ModulesOpenByAliasInAnyCaseAndByTheirPciAddress) {
         EXPECT_EQ(int32(vi, 1150002), 0x7405) << name;
     }
     EXPECT_EQ(int32(open("PXI0::2-4.0::INSTR"), 1150002), 0x7406);
+    // A serial number that is not hexadecimal reads as 0.
+    machine("add " + _root + " 1 9 --serial 12xy");
+    DeviceDaemon slot9(_root + "/dev/tiktal3");
+    EXPECT_EQ(int32(open("PXI1Slot9"), 1150001), 0);
     // Names that are no address of a module here, or no address at all.
     for (const char* name : {"PXI1::2-2.0::INSTR", "PXI0::2-2.1::INSTR", "PXI0::256-2.0::INSTR", "PXI0::2-32.0::INSTR",
                              "PXI0::2-2.8::INSTR", "PXI0::MEMACC", "PXI0::1::BACKPLANE", "PXI0::CHASSIS1::SLOT2",
