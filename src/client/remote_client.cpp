@@ -18,7 +18,7 @@ constexpr char kScheme[] = "http://";
 constexpr char kPrefix[] = "tiktalwebs";
 constexpr char kMediaType[] = "vnd.zr.tiktal.v1/json; charset=utf-8";
 constexpr std::uint32_t kTimeoutInMS = 5000;
-constexpr char kMissingParameter[] = "Encountered missing parameter needed for task completion.";
+using zrerr::kMissingParameter;
 constexpr char kParseFailure[] = "Failed to parse data from a remote device.";
 
 // Percent-encodes every byte that is not unreserved in a URI, so that no name can reach another

@@ -100,6 +100,9 @@ public:
     }
 };
 
+// The "message" of a null output parameter, with "value": "NULL".
+inline constexpr char kMissingParameter[] = "Encountered missing parameter needed for task completion.";
+
 // Builds the exception of a raise site: the code and the four standard members; site members
 // go into the object named `debugTag`.
 Exception raise(std::int32_t code, const char* constant, const char* file, int line,

@@ -38,10 +38,11 @@ bool isPresent(const zrjsonconfig::DeviceEntry& device) {
 
 // The session of the local device `name` names, from a list built now if the cached one does
 // not hold it present: a device that appeared since is found, a name that no device has costs
-// one rebuild.
+// one rebuild. (When another thread rebuilt the list in between, the list of the second pass is
+// as new as one this call would build.)
 std::unique_ptr<Session> openLocalDevice(const char* resourceName) {
     const std::string name = resourceName;
-    for (;;) {
+    for (int pass = 0;; ++pass) {
         const CachedDeviceList list = cachedDeviceList();
         DeviceEntryPtr device = findByAlias(*list.devices, name);
         if (!device) device = findByPciAddress(*list.devices, name);
@@ -51,7 +52,7 @@ std::unique_ptr<Session> openLocalDevice(const char* resourceName) {
             if (isTimingModule(device->configured())) return PxieQ300tSession::open(*device);
             unknownName(resourceName);  // present, but no device this driver opens
         }
-        if (list.built) unknownName(resourceName);
+        if (list.built || pass > 0) unknownName(resourceName);
         dropDeviceList(list.devices);
     }
 }

@@ -13,7 +13,7 @@ constexpr ViAttr kSerialNumber = 1150001;
 constexpr ViAttr kDeviceId = 1150002;
 constexpr ViAttr kFirstTerminalValue = 1150100;
 constexpr ViAttr kTerminalValues = 6;
-constexpr char kMissingParameter[] = "Encountered missing parameter needed for task completion.";
+using zrerr::kMissingParameter;
 
 // A failed device request as the status exception, with where the request failed.
 void raiseIfError(const nZRAPALS100::tStatus& status) {

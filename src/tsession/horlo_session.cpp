@@ -17,7 +17,7 @@ namespace {
 
 using Lock = std::lock_guard<std::mutex>;
 
-constexpr char kMissingParameter[] = "Encountered missing parameter needed for task completion.";
+using zrerr::kMissingParameter;
 constexpr char kParseFailure[] = "Failed to parse attribute from Horlo metadata.";
 const char* const kEnableableTypes[] = {"IEEE 802.1AS-2011", "IEEE 1588-2008", "IEEE 802.1AS-2011 TAB", "IEEE 1588-2008 BC"};
 

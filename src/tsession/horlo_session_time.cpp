@@ -38,7 +38,7 @@ void HorloSession::getTimeReferenceNames(std::string& valueString) {
 void HorloSession::getTime(ViUInt32* timeSeconds, ViUInt32* timeNanoseconds, ViUInt16* timeFractionalNanoseconds) {
     if (!timeSeconds || !timeNanoseconds || !timeFractionalNanoseconds)
         throw ZRERR_RAISE(tiktalerr_invParameter)
-            .debug("message", "Encountered missing parameter needed for task completion.")
+            .debug("message", zrerr::kMissingParameter)
             .debug("func", "tiktal::HorloSession::getTime");
     const Lock hold(_lock);
     std::string json, text;
