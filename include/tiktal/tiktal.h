@@ -301,6 +301,14 @@ TIKTAL_API ViStatus _VI_FUNC tiktal_GVInitAdvanced(ViRsrc resourceName, ViInt32 
 TIKTAL_API ViStatus _VI_FUNC tiktal_ConfigureLogicBlock(ViSession vi, ViConstString logicBlock, ViUInt32 operation, ViUInt32 dStarCMask, ViUInt32 pfiMask);
 TIKTAL_API ViStatus _VI_FUNC tiktal_GetLogicBlockConfiguration(ViSession vi, ViConstString logicBlock, ViUInt32* operation, ViUInt32* dStarCMask, ViUInt32* pfiMask);
 TIKTAL_API ViStatus _VI_FUNC tiktal_AdjustTime_beta(ViSession vi, ViUInt64 timeReferenceNanos, ViUInt64 timeKeeperNanos);
+/* The graphical environment Graviton tells the library its run-time module, with which
+ * tiktal_GVInit and tiktal_GVInitAdvanced register, and tiktal_GVClose withdraws, the clean-up of
+ * a session (RTSetCleanupProc). SetGVRTModule takes the handle that dlopen returned for the run
+ * time; SetGVRTTLSIndex a pthread_key_t that the run time created, whose value in a thread is
+ * that thread's run-time module (0xFFFFFFFF: none). Without either, the run time is the main
+ * program when it defines gGVRTVersion or AZNewHandle, else libgrrt.so or libgrffrt.so when
+ * loaded. The three variants end the process (a line on standard error, exit status 1) when
+ * there is no run time: call them only from a Graviton process. */
 TIKTAL_API void _VI_FUNC SetGVRTModule(void* module);
 TIKTAL_API void _VI_FUNC SetGVRTModuleHook(void);
 TIKTAL_API void _VI_FUNC SetGVRTTLSIndex(ViUInt32 index);

@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <initializer_list>
 #include <memory>
 #include <string>
 #include <vector>
@@ -76,6 +77,27 @@ int readAttributeFile(const std::string& path, std::string& text) noexcept;
 
 // Whether something (a file, a folder, a link) is at `path`.
 bool exists(const std::string& path) noexcept;
+
+// Modules of the graphical environment's run time. A module handle is what dlopen returns for a
+// loaded object (the main program included); none is null.
+//
+// The module in the calling thread's slot `index`: on this system the index is a pthread_key_t
+// that the run time created, whose value in each thread is that thread's module. Null for the
+// index 0xFFFFFFFF (none) and for an empty slot.
+void* threadModule(std::uint32_t index) noexcept;
+// The main program, when it defines one of `names` itself (not through a library it loaded).
+void* mainProgramDefining(std::initializer_list<const char*> names) noexcept;
+// The library of file name `name` when it is loaded already; nothing is loaded.
+void* loadedLibrary(const char* name) noexcept;
+// The address of `name` defined in `module` itself, or null.
+void* moduleSymbol(void* module, const char* name) noexcept;
+// A stamp of the module's file that is the same for every load of that file and never 0.
+std::uint32_t moduleStamp(void* module) noexcept;
+// Whether `module` is still loaded (the handle is compared, never followed).
+bool isModuleLoaded(void* module) noexcept;
+// Writes "Fatal Error: " + `text` as one line on standard error and ends the process at once with
+// exit status 1 (the process is in no state to run its exit handlers).
+[[noreturn]] void fatalError(const std::string& text) noexcept;
 
 // The platform status of an operating-system error number (0 for 0).
 std::int32_t statusOfOsError(int error) noexcept;
