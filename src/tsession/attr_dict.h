@@ -1,11 +1,13 @@
 // The time-service attribute dictionary: which accessor type an attribute has, whether it needs
-// a time-reference name, and its JSON key per time-reference type.
+// a time-reference name, its JSON key per time-reference type, and its enumeration.
 #pragma once
 
 #include <map>
 #include <string>
 
 #include <tiktal/tiktal.h>
+
+#include "enumerations.h"
 
 namespace tiktal {
 
@@ -15,6 +17,7 @@ struct ApiAttrData {
     bool activeItemRequired;
     AttrValueType valueType;
     std::map<std::string, std::string> metaDataKeys;  // type text, or "all", to JSON key
+    Enumeration enumeration;                          // what an Int32 attribute's numbers stand for
 
     // False when no name is needed; true when one is needed and given; fails when it is missing.
     bool verifyActiveItemProvided(ViConstString activeItem) const;

@@ -1,4 +1,5 @@
-// Conversions between the time service's texts and the numbers of the Int32 attributes.
+// Conversions between the time service's texts and the numbers of the Int32 attributes, by the
+// enumerations of src/tables/enumerations.tsv.
 #pragma once
 
 #include <cstdint>
@@ -10,6 +11,8 @@ namespace tiktal {
 
 // The IEEE 1588 accuracy code of a name; 0xFE (unknown) for a name not in the table.
 std::uint8_t getClockAccuracyCodeFromString(const std::string& name);
+// The number of an IEEE 1588 accuracy, counted from 1; 0 (unknown) for a name not in the table.
+ViInt32 getPtpClockAccuracyFromString(const std::string& name);
 
 // These fail with tiktalerr_internalSoftware for a text not in their table.
 ViInt32 getPtpPortStateEnumFromString(const std::string& text);

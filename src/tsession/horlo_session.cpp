@@ -38,9 +38,6 @@ double finite(double value) {
     return value;
 }
 
-bool isPtpAccuracy(ViAttr a) { return a == TIKTAL_ATTR_1588_CLOCK_ACCURACY || a == TIKTAL_ATTR_1588_GM_CLOCK_ACCURACY; }
-bool is8021asAccuracy(ViAttr a) { return a == TIKTAL_ATTR_8021AS_CLOCK_ACCURACY || a == TIKTAL_ATTR_8021AS_GM_CLOCK_ACCURACY; }
-
 std::unique_ptr<zrhorlo::RemoteClientApiWrapper> connect(const std::string& resourceName) {
     const horloUtils::HorloUri uri(resourceName);
     try {
@@ -128,16 +125,20 @@ void HorloSession::getAttributeViInt32(ViConstString terminalName, ViAttr attrib
     requireOutput(value);
     const Lock hold(_lock);
     const std::string key = getMetaDataKey(terminalName, attribute, AttrValueType::Int32);
-    if (attribute == TIKTAL_ATTR_1588_PORT_STATE) {
+    switch (getAttrData(attribute).enumeration) {
+    case Enumeration::PtpPortState:
         *value = getPtpPortStateEnumFromString(readTrAttrText(terminalName, key));
-    } else if (attribute == TIKTAL_ATTR_8021AS_PORT_STATE) {
+        return;
+    case Enumeration::GptpPortState:
         *value = get8021asPortStateEnumFromString(readTrAttrText(terminalName, key));
-    } else if (attribute == TIKTAL_ATTR_1588_BMCA_MODE) {
+        return;
+    case Enumeration::BmcaMode:
         *value = getBmcaModeEnumFromString(readTrAttrText(terminalName, key));
-    } else if (isPtpAccuracy(attribute)) {
-        const std::uint8_t code = getClockAccuracyCodeFromString(readTrAttrText(terminalName, key));
-        *value = code == 0xFE ? 0 : code - 31;
-    } else if (is8021asAccuracy(attribute)) {
+        return;
+    case Enumeration::PtpClockAccuracy:
+        *value = getPtpClockAccuracyFromString(readTrAttrText(terminalName, key));
+        return;
+    case Enumeration::GptpClockAccuracy: {
         const std::string json = getTrAttr(terminalName, key);
         std::string text;
         try {
@@ -148,7 +149,12 @@ void HorloSession::getAttributeViInt32(ViConstString terminalName, ViAttr attrib
             // The service sent the code as a number.
             zrjson::getInt32NumberMember(json, key.c_str(), *value, zrjson::OnNull::fail);
         }
-    } else if (attribute == TIKTAL_ATTR_8021AS_NEIGHBOR_PROP_DELAY_THRESHOLD) {
+        return;
+    }
+    case Enumeration::None:
+        break;
+    }
+    if (attribute == TIKTAL_ATTR_8021AS_NEIGHBOR_PROP_DELAY_THRESHOLD) {
         *value = zrjson::getInt32Member(getTrAttr(terminalName, key), key.c_str());
     } else {
         const std::string json = getTrAttr(terminalName, key);
@@ -197,7 +203,8 @@ void HorloSession::setAttributeViInt32(ViConstString terminalName, ViAttr attrib
     const Lock hold(_lock);
     const std::string key = getMetaDataKey(terminalName, attribute, AttrValueType::Int32);
     writeTrAttr(terminalName, key,
-                attribute == TIKTAL_ATTR_1588_BMCA_MODE ? getBmcaModeStringFromEnum(value) : std::to_string(value));
+                getAttrData(attribute).enumeration == Enumeration::BmcaMode ? getBmcaModeStringFromEnum(value)
+                                                                            : std::to_string(value));
 }
 
 void HorloSession::setAttributeViBoolean(ViConstString terminalName, ViAttr attribute, ViBoolean value) {

@@ -52,8 +52,18 @@ TEST(Enums, PortStatesAccuraciesAndBmcaModes) {
     EXPECT_EQ(getClockAccuracyCodeFromString("WITHIN_25NS"), 0x20);
     EXPECT_EQ(getClockAccuracyCodeFromString("GREATER_THAN_10S"), 0x31);
     EXPECT_EQ(getClockAccuracyCodeFromString("within_25ns"), 0xFE);
+    EXPECT_EQ(getClockAccuracyCodeFromString("WITHIN_2.5US"), 0x24);
+    EXPECT_EQ(getClockAccuracyCodeFromString("ACCURACY_UNKNOWN"), 0xFE);
+    // The 1588 accuracies count the same names from 1; 0 is unknown.
+    EXPECT_EQ(getPtpClockAccuracyFromString("WITHIN_25NS"), 1);
+    EXPECT_EQ(getPtpClockAccuracyFromString("WITHIN_2.5US"), 5);
+    EXPECT_EQ(getPtpClockAccuracyFromString("GREATER_THAN_10S"), 18);
+    EXPECT_EQ(getPtpClockAccuracyFromString("ACCURACY_UNKNOWN"), 0);
+    EXPECT_EQ(getPtpClockAccuracyFromString("WITHIN_3US"), 0);
+    EXPECT_EQ(get8021asPortStateEnumFromString("PTP_INITIALIZING"), 3);
     EXPECT_EQ(getBmcaModeEnumFromString("masteronly"), 2);
     EXPECT_EQ(getBmcaModeStringFromEnum(1), "masterslave");
+    EXPECT_EQ(getBmcaModeStringFromEnum(0), "slaveonly");
     EXPECT_EQ(status([] { getBmcaModeStringFromEnum(3); }), tiktalerr_invParameter);
     EXPECT_EQ(status([] { getBmcaModeStringFromEnum(-1); }), tiktalerr_invParameter);
     EXPECT_EQ(status([] { getBmcaModeEnumFromString("MasterSlave"); }), tiktalerr_internalSoftware);

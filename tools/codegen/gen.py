@@ -4,7 +4,10 @@
 operations.tsv feeds the session base class, the call-tracing session and (with exports.tsv)
 the exported functions, the version script and the Windows module definition; statuses.tsv
 feeds the message table; attributes.tsv the time-service attribute dictionary; both attribute
-tables the list of attributes that the tiktal command knows by name; roco_functions.tsv the C
+tables the list of attributes that the tiktal command knows by name; enumerations.tsv the numbers
+of the enumerated attributes, for the library and the command; the attribute tables and
+enumerations.tsv together the enumerations and attributes of the Python package
+(python/_attributes.py, which python/setup.py writes too when pip builds the package); roco_functions.tsv the C
 interface of the routing service and the library's table of its functions; qpxi_functions.tsv the
 same for the PXI chassis query library; device_requests.tsv the
 timing module's driver requests, for the library's proxy and for the device daemon."""
@@ -245,16 +248,106 @@ constexpr StatusRow kStatusTable[] = {{
 """
 
 
+ENUMERATION_NONE = "-"
+
+
+def load_service_attributes(tables):
+    """The rows of attributes.tsv: identifier, constant, type, whether a time-reference name is
+    needed, whether the attribute may be written, its enumeration, and its JSON keys by type."""
+    path = os.path.join(tables, "attributes.tsv")
+    with open(path, encoding="utf-8") as f:
+        header = [line.rstrip("\n").split("\t") for line in f if line.startswith("# identifier")][0]
+    types = header[6:]
+    attributes = []
+    for identifier, constant, value_type, active, access, enumeration, *keys in read_tsv(path):
+        if active not in ("required", "not-used") or access not in ("read", "read-write"):
+            raise SystemExit(f"attributes.tsv: {constant}: active item {active!r}, access {access!r}")
+        if enumeration != ENUMERATION_NONE and value_type != "Int32":
+            raise SystemExit(f"attributes.tsv: {constant}: only Int32 attributes have an enumeration")
+        attributes.append(dict(id=int(identifier), constant=constant, type=value_type, item=active == "required",
+                               writable=access == "read-write", enumeration=enumeration,
+                               keys=[(t, "" if k == '""' else k) for t, k in zip(types, keys) if k != "-"]))
+    return attributes
+
+
+def load_module_attributes(tables):
+    attributes = []
+    for identifier, constant, value_type, access in read_tsv(os.path.join(tables, "module_attributes.tsv")):
+        if access not in ("read", "read-write"):
+            raise SystemExit(f"module_attributes.tsv: {constant}: access {access!r}")
+        attributes.append(dict(id=int(identifier), constant=constant, type=value_type, item=False,
+                               writable=access == "read-write", enumeration=ENUMERATION_NONE, keys=[]))
+    return attributes
+
+
+def load_enumerations(tables):
+    """Enumeration name -> its members in table order: name, value, service text (None for none)
+    and whether other texts read as the member. Names and values are unique within an
+    enumeration, and at most one member takes the other texts."""
+    enumerations = {}
+    for enumeration, member, value, text, others in read_tsv(os.path.join(tables, "enumerations.tsv")):
+        if others not in ("yes", "-"):
+            raise SystemExit(f"enumerations.tsv: {enumeration}.{member}: others {others!r}")
+        enumerations.setdefault(enumeration, []).append(
+            dict(name=member, value=int(value, 0), text=None if text == "-" else text, others=others == "yes"))
+    for enumeration, members in enumerations.items():
+        for field in ("name", "value"):
+            values = [m[field] for m in members]
+            if len(set(values)) != len(values):
+                raise SystemExit(f"enumerations.tsv: {enumeration}: a {field} comes twice")
+        if sum(m["others"] for m in members) > 1:
+            raise SystemExit(f"enumerations.tsv: {enumeration}: more than one member takes the other texts")
+        if not all(re.fullmatch(r"[A-Z][A-Z0-9_]*", m["name"]) for m in members):
+            raise SystemExit(f"enumerations.tsv: {enumeration}: member names are upper-case identifiers")
+    return enumerations
+
+
+def check_enumerations(attributes, enumerations):
+    for a in attributes:
+        if a["enumeration"] != ENUMERATION_NONE and a["enumeration"] not in enumerations:
+            raise SystemExit(f"attributes.tsv: {a['constant']}: no enumeration {a['enumeration']}")
+
+
+def gen_enumerations(enumerations):
+    """The enumeration of each enumerated attribute, and the members of every enumeration."""
+    names = ", ".join(["None"] + list(enumerations))
+    tables = []
+    for enumeration, members in enumerations.items():
+        rows = "\n".join(f"    {{{c_string(m['name'])}, {m['value']}, {c_string(m['text']) if m['text'] else 'nullptr'}, "
+                         f"{'true' if m['others'] else 'false'}}}," for m in members)
+        tables.append(f"inline constexpr EnumerationMember k{enumeration}[] = {{\n{rows}\n}};")
+    return f"""// Generated from src/tables/enumerations.tsv.
+#pragma once
+
+#include <tiktal/tiktal.h>
+
+namespace tiktal {{
+
+// The enumeration whose numbers an Int32 attribute reads and writes (None: a plain number).
+enum class Enumeration {{ {names} }};
+
+struct EnumerationMember {{
+    const char* name;  // the member's name (also in the tiktal command's output)
+    ViInt32 value;     // the number of the C interface
+    const char* text;  // the service's text, or null when the member has none of its own
+    bool others;       // texts that the enumeration does not list read as this member
+}};
+
+{chr(10).join(tables)}
+
+}}  // namespace tiktal
+"""
+
+
 def gen_attribute_dictionary(tables):
-    rows = read_tsv(os.path.join(tables, "attributes.tsv"))
-    with open(os.path.join(tables, "attributes.tsv"), encoding="utf-8") as f:
-        types = [line.rstrip("\n").split("\t")[4:] for line in f if line.startswith("# identifier")][0]
+    attributes = load_service_attributes(tables)
     records = []
-    for identifier, constant, value_type, active, *keys in rows:
-        present = [(t, "" if k == '""' else k) for t, k in zip(types, keys) if k != "-"]
-        entries = ", ".join(f'{{"{t}", {c_string(k)}}}' for t, k in present)
-        records.append(f"    {{{constant}, {{{'true' if active == 'required' else 'false'}, AttrValueType::{value_type}, {{{entries}}}}}}},")
-    checks = "\n".join(f"static_assert({c} == {i}u, \"{c}\");" for i, c, *_ in rows)
+    for a in attributes:
+        entries = ", ".join(f'{{"{t}", {c_string(k)}}}' for t, k in a["keys"])
+        enumeration = "None" if a["enumeration"] == ENUMERATION_NONE else a["enumeration"]
+        records.append(f"    {{{a['constant']}, {{{'true' if a['item'] else 'false'}, AttrValueType::{a['type']}, "
+                       f"{{{entries}}}, Enumeration::{enumeration}}}}},")
+    checks = "\n".join(f"static_assert({a['constant']} == {a['id']}u, \"{a['constant']}\");" for a in attributes)
     return f"""// Generated from src/tables/attributes.tsv.
 const std::unordered_map<ViAttr, ApiAttrData> kHorloApiAttrDict = {{
 {chr(10).join(records)}
@@ -265,14 +358,89 @@ const std::unordered_map<ViAttr, ApiAttrData> kHorloApiAttrDict = {{
 
 def gen_command_attributes(tables):
     """Every attribute by constant name, with its value type and whether it names a time reference."""
-    service = [(c, t, a == "required") for _, c, t, a, *_ in read_tsv(os.path.join(tables, "attributes.tsv"))]
-    module = [(c, t, False) for _, c, t, _ in read_tsv(os.path.join(tables, "module_attributes.tsv"))]
-    rows = "\n".join(f'    {{"{c}", {c}, AttributeType::{t}, {"true" if item else "false"}}},' for c, t, item in service + module)
+    attributes = load_service_attributes(tables) + load_module_attributes(tables)
+    rows = "\n".join(f'    {{"{a["constant"]}", {a["constant"]}, AttributeType::{a["type"]}, '
+                     f'{"true" if a["item"] else "false"}}},' for a in attributes)
+    # The header's constants are the tables' numbers (the service's are checked with the dictionary).
+    checks = "\n".join(f"static_assert({a['constant']} == {a['id']}u, \"{a['constant']}\");"
+                       for a in load_module_attributes(tables))
     return f"""// Generated from src/tables/attributes.tsv and src/tables/module_attributes.tsv.
 const AttributeInfo kAttributes[] = {{
 {rows}
 }};
+{checks}
 """
+
+
+ATTRIBUTE_PREFIX = "TIKTAL_ATTR_"
+# A Python name cannot start with a digit: the two families of time-reference attributes get words.
+PYTHON_FAMILIES = (("1588_", "ptp_"), ("8021AS_", "gptp_"))
+PYTHON_TYPES = {"Int32": ("Int32Attribute", "int"), "Real64": ("Real64Attribute", "float"),
+                "Boolean": ("BooleanAttribute", "bool"), "String": ("StringAttribute", "str")}
+
+
+def python_name(constant):
+    """TIKTAL_ATTR_1588_PRIORITY1 -> ptp_priority1, TIKTAL_ATTR_8021AS_AS_CAPABLE -> gptp_as_capable."""
+    if not constant.startswith(ATTRIBUTE_PREFIX):
+        raise SystemExit(f"{constant}: an attribute constant starts with {ATTRIBUTE_PREFIX}")
+    name = constant[len(ATTRIBUTE_PREFIX):]
+    for prefix, word in PYTHON_FAMILIES:
+        if name.startswith(prefix):
+            name = word + name[len(prefix):]
+    name = name.lower()
+    if not re.fullmatch(r"[a-z_][a-z0-9_]*", name):
+        raise SystemExit(f"{constant}: {name!r} is not a Python name")
+    return name
+
+
+def python_descriptor(a):
+    """One attribute as a class member with its docstring."""
+    access = "read and write" if a["writable"] else "read only"
+    if a["enumeration"] != ENUMERATION_NONE:
+        call = f"EnumAttribute({a['id']}, {a['constant']!r}, {a['enumeration']}, writable={a['writable']})"
+        what = f"{a['enumeration']} (Int32), {access}"
+    else:
+        cls, kind = PYTHON_TYPES[a["type"]]
+        call = f"{cls}({a['id']}, {a['constant']!r}, writable={a['writable']})"
+        what = f"{kind} ({a['type']}), {access}"
+    return f'    {python_name(a["constant"])} = {call}\n    """{a["constant"]} ({a["id"]}): {what}."""\n'
+
+
+def gen_python_attributes(tables):
+    """The Python package's enumerations, and its attributes as typed properties: those that name
+    a time reference on the time references, the others on the session."""
+    service = load_service_attributes(tables)
+    module = load_module_attributes(tables)
+    enumerations = load_enumerations(tables)
+    check_enumerations(service, enumerations)
+    names = [python_name(a["constant"]) for a in service + module]
+    if len(set(names)) != len(names):
+        raise SystemExit("two attributes have the same Python name")
+    enum_classes = []
+    for enumeration, members in enumerations.items():
+        users = ", ".join(python_name(a["constant"]) for a in service if a["enumeration"] == enumeration)
+        body = "".join(f"    {m['name']} = {m['value']}\n" for m in members)
+        enum_classes.append(f'class {enumeration}(enum.IntEnum):\n    """The numbers of {users or "no attribute"}."""\n\n{body}')
+    session = [a for a in service if not a["item"]] + module
+    reference = [a for a in service if a["item"]]
+    exported = ", ".join(repr(e) for e in enumerations)
+    return (
+        '"""Enumerations and attributes of libtiktal, generated by tools/codegen/gen.py from\n'
+        'src/tables/attributes.tsv, module_attributes.tsv and enumerations.tsv: do not edit."""\n'
+        "import enum\n\n"
+        "from .attributes import BooleanAttribute, EnumAttribute, Int32Attribute, Real64Attribute, StringAttribute\n\n"
+        f"__all__ = [{exported}, 'SessionAttributes', 'TimeReferenceAttributes']\n\n\n"
+        + "\n\n".join(enum_classes)
+        + "\n\nclass SessionAttributes:\n"
+        '    """The attributes of a session that name no time reference: those of a time service\'s\n'
+        '    selected time reference, and those of a timing module."""\n\n'
+        "    __slots__ = ()\n\n"
+        + "\n".join(python_descriptor(a) for a in session)
+        + "\n\nclass TimeReferenceAttributes:\n"
+        '    """The attributes of one time reference of a time service."""\n\n'
+        "    __slots__ = ()\n\n"
+        + "\n".join(python_descriptor(a) for a in reference))
+
 
 ROCO_FUNCTION_COUNT = 56
 QPXI_FUNCTION_COUNT = 17
@@ -679,6 +847,10 @@ def main():
     files["cjsonForwarders.cpp"] = gen_cjson_forwarders(cjson)
     files["statusTable.inc"] = gen_status_table(statuses)
     files["HorloApiAttrDict.inc"] = gen_attribute_dictionary(args.tables)
+    enumerations = load_enumerations(args.tables)
+    check_enumerations(load_service_attributes(args.tables), enumerations)
+    files["enumerations.h"] = gen_enumerations(enumerations)
+    files["python/_attributes.py"] = gen_python_attributes(args.tables)
     files["commandAttributes.inc"] = gen_command_attributes(args.tables)
     roco = load_roco_functions(args.tables)
     files["zrrocoapi.h"] = gen_roco_header(roco)
@@ -691,6 +863,7 @@ def main():
     files["InterfaceProxyTiktal.h"], files["InterfaceProxyTiktal.cpp"] = gen_device_proxy(device_requests)
     for name, text in files.items():
         path = os.path.join(args.out, name)
+        os.makedirs(os.path.dirname(path), exist_ok=True)
         old = open(path, encoding="utf-8").read() if os.path.exists(path) else None
         if old != text:
             with open(path, "w", encoding="utf-8") as f:

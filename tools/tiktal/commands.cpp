@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "attributes.h"
+#include "enumerations.h"
 #include "errors.h"
 #include "output.h"
 #include "session.h"
@@ -113,16 +114,18 @@ struct Family {
     std::string (*stateName)(ViInt32);
 };
 
-std::string ieee1588StateName(ViInt32 state) {
-    static const char* const names[] = {"INITIALIZING", "FAULTY",  "DISABLED",     "LISTENING", "PRE_MASTER",
-                                        "MASTER",       "PASSIVE", "UNCALIBRATED", "SLAVE"};
-    return state >= 0 && state <= 8 ? names[state] : "UNKNOWN";
+// The name of a port state's member in its enumeration (enumerations.h), or UNKNOWN.
+template <std::size_t N>
+std::string memberName(const tiktal::EnumerationMember (&members)[N], ViInt32 value) {
+    for (const tiktal::EnumerationMember& member : members)
+        if (member.value == value) return member.name;
+    return "UNKNOWN";
 }
 
+std::string ieee1588StateName(ViInt32 state) { return memberName(tiktal::kPtpPortState, state); }
+
 // The service reports 802.1AS port states as master, slave, or 3 for any other state.
-std::string ieee8021asStateName(ViInt32 state) {
-    return state == 6 ? "MASTER" : state == 9 ? "SLAVE" : state == 3 ? "OTHER" : "UNKNOWN";
-}
+std::string ieee8021asStateName(ViInt32 state) { return memberName(tiktal::kGptpPortState, state); }
 
 const Family k1588{TIKTAL_ATTR_1588_PORT_STATE, TIKTAL_ATTR_1588_CLOCK_ID, TIKTAL_ATTR_1588_GM_CLOCK_ID,
                    ieee1588StateName};
