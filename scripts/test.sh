@@ -1,5 +1,6 @@
 #!/usr/bin/env bash
-# Builds the library and runs every test: a normal build, a build under AddressSanitizer and
+# Builds the library and runs every test: a normal build, then the Python package's tests (ctest's
+# python.package, run here on their own), a build under AddressSanitizer and
 # UndefinedBehaviorSanitizer, the concurrency tests under ThreadSanitizer, and a short run of every
 # fuzz target on its seed corpus.
 set -euo pipefail
@@ -18,7 +19,10 @@ clang=(-DCMAKE_C_COMPILER=clang -DCMAKE_CXX_COMPILER=clang++ -DTIKTAL_BENCH=OFF)
 
 echo "== build and test"
 build build
-ctest --test-dir build --output-on-failure -j "$jobs"
+ctest --test-dir build --output-on-failure -j "$jobs" -E '^python\.package$'
+
+echo "== Python package (installed offline into a fresh virtual environment, tested with pytest)"
+tests/python/run_tests.sh build .
 
 echo "== AddressSanitizer + UndefinedBehaviorSanitizer"
 build build-asan "${clang[@]}" -DTIKTAL_SANITIZE=address,undefined

@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # Installs the build into a temporary prefix, builds the examples against it with pkg-config and
-# with the CMake package, and runs them against the installed time-service simulator.
+# with the CMake package, and runs them against the installed time-service simulator; so does the
+# Python package installed with them, with the Python the build was configured with.
 # Usage: install_test.sh BUILD_DIR SOURCE_DIR
 set -euo pipefail
 build=$1
@@ -14,7 +15,7 @@ expect() {  # expect FILE TEXT: the output holds the text
 }
 
 prefix=$work/prefix
-cmake --install "$build" --prefix "$prefix" >/dev/null
+cmake --install "$build" --prefix "$prefix" >"$work/install.log"
 libdir=$(dirname "$(find "$prefix" -name 'libtiktal.so' | head -n 1)")
 [ -f "$libdir/pkgconfig/tiktal.pc" ] || fail "no pkg-config file"
 [ -f "$libdir/cmake/tiktal/tiktalConfig.cmake" ] || fail "no CMake package"
@@ -59,3 +60,19 @@ expect "$work/out" "TAB1  IEEE 802.1AS-2011 TAB"
 "$work/pc/time_references" "sync://localhost/system" >"$work/out" 2>&1 && fail "localhost was accepted"
 expect "$work/out" "tiktal_init failed: 0xBFFA4016 The specified device was not found."
 echo "install test passed"
+
+# The Python package: the install says where it went (a temporary prefix is on no Python's path),
+# and the package finds the library installed beside it, with no variable naming it.
+python=$(sed -n 's/^TIKTAL_PYTHON:FILEPATH=//p' "$build/CMakeCache.txt")
+pythonpath=$(sed -n 's/.*does not search: export PYTHONPATH=//p' "$work/install.log")
+[ -f "$pythonpath/tiktal/_attributes.py" ] || { cat "$work/install.log"; fail "the Python package is not where the install says"; }
+[ -f "$pythonpath/tiktal/py.typed" ] || fail "the Python package lacks py.typed"
+run_python() {
+  env -u TIKTAL_LIBRARY -u LD_LIBRARY_PATH PYTHONPATH="$pythonpath" "$python" "$@"
+}
+run_python -c 'import tiktal; print(tiktal.library_path())' >"$work/out" 2>&1 || { cat "$work/out"; fail "import tiktal"; }
+[ "$(cat "$work/out")" = "$libdir/libtiktal.so.0" ] || { cat "$work/out"; fail "the package did not load the library beside it"; }
+run_python "$source/examples/python/time_references.py" "sync://$address/system" >"$work/out" 2>&1 ||
+  { cat "$work/out"; fail "examples/python/time_references.py"; }
+expect "$work/out" "selected  PTP1 (IEEE 1588-2008), offset 1.5 s"
+expect "$work/out" "AS1   IEEE 802.1AS-2011      yes      no        MASTER (6)  246"
