@@ -6,8 +6,8 @@ writes them from the library's tables, ../src/tables, with the library's own gen
 built from the libtiktal source tree (pip install ./python), and always matches the library built
 beside it. The version is the library's, from ../CMakeLists.txt.
 """
-import importlib.util
 import re
+import runpy
 from pathlib import Path
 
 from setuptools import setup
@@ -18,15 +18,13 @@ GENERATOR = SOURCE_TREE / "tools" / "codegen" / "gen.py"
 TABLES = SOURCE_TREE / "src" / "tables"
 
 
-def generator():
-    """The module of tools/codegen/gen.py, loaded from its file."""
+def generate_attributes():
+    """The text of tiktal/_attributes.py, from tools/codegen/gen.py run on the tables."""
     if not GENERATOR.is_file() or not TABLES.is_dir():
         raise SystemExit(f"tiktal: build the package inside the libtiktal source tree: it needs {GENERATOR} "
                          f"and {TABLES}")
-    spec = importlib.util.spec_from_file_location("tiktal_codegen", GENERATOR)
-    module = importlib.util.module_from_spec(spec)
-    spec.loader.exec_module(module)
-    return module
+    generator = runpy.run_path(str(GENERATOR), run_name="tiktal_codegen")
+    return generator["gen_python_attributes"](str(TABLES))
 
 
 class BuildPyWithAttributes(build_py):
@@ -38,7 +36,7 @@ class BuildPyWithAttributes(build_py):
         self.announce(f"generating {target} from {TABLES}", level=2)
         if not self.dry_run:
             target.parent.mkdir(parents=True, exist_ok=True)
-            target.write_text(generator().gen_python_attributes(str(TABLES)), encoding="utf-8")
+            target.write_text(generate_attributes(), encoding="utf-8")
 
     def get_outputs(self, include_bytecode=True):
         return super().get_outputs(include_bytecode) + [str(Path(self.build_lib) / "tiktal" / "_attributes.py")]
