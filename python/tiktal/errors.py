@@ -24,38 +24,38 @@ def status_hex(code: int) -> str:
     return f"0x{code & 0xFFFFFFFF:08X}"
 
 
-class Error(Exception):
+class _Status:
+    """What an error and a warning both carry: the status, the library's text of it, and the C
+    function that returned it."""
+
+    code: int
+    message: str
+    function: str
+
+    def __init__(self, code: int, message: str, function: str) -> None:
+        super().__init__(code, message, function)  # type: ignore[call-arg]
+        self.code = code
+        self.message = message
+        self.function = function
+
+    def __str__(self) -> str:
+        return f"{self.function}: {status_hex(self.code)} {self.message}"
+
+
+class Error(_Status, Exception):
     """A call of libtiktal failed.
 
     code is the status (a negative number, as the C interface returns it), message the library's
     text of it, and function the C function that returned it.
     """
 
-    def __init__(self, code: int, message: str, function: str) -> None:
-        super().__init__(code, message, function)
-        self.code = code
-        self.message = message
-        self.function = function
 
-    def __str__(self) -> str:
-        return f"{self.function}: {status_hex(self.code)} {self.message}"
-
-
-class Warning(UserWarning):  # noqa: A001 - the package's warning class is tiktal.Warning
+class Warning(_Status, UserWarning):  # noqa: A001 - the package's warning class is tiktal.Warning
     """A call of libtiktal returned a warning: a positive status. It is emitted through the
     warnings module (warnings.simplefilter("error", tiktal.Warning) raises it instead).
 
     code is the status, message the library's text of it, and function the C function.
     """
-
-    def __init__(self, code: int, message: str, function: str) -> None:
-        super().__init__(code, message, function)
-        self.code = code
-        self.message = message
-        self.function = function
-
-    def __str__(self) -> str:
-        return f"{self.function}: {status_hex(self.code)} {self.message}"
 
 
 class LibraryError(OSError):

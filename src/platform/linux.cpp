@@ -614,6 +614,13 @@ link_map* linkMapOf(void* module) {
     return module && dlinfo(module, RTLD_DI_LINKMAP, &map) == 0 ? map : nullptr;
 }
 
+// The main program's handle; the program stays loaded, so the reference is given back at once.
+void* mainProgram() noexcept {
+    void* program = dlopen(nullptr, RTLD_NOW);
+    if (program) dlclose(program);
+    return program;
+}
+
 // The loaded object that defines the address `symbol`.
 link_map* definingObject(const void* symbol) {
     Dl_info info{};
@@ -629,7 +636,7 @@ void* threadModule(std::uint32_t index) noexcept {
 }
 
 void* mainProgramDefining(std::initializer_list<const char*> names) noexcept {
-    void* program = dlopen(nullptr, RTLD_NOW);
+    void* program = mainProgram();
     for (const char* name : names)
         if (moduleSymbol(program, name)) return program;
     return nullptr;
@@ -663,7 +670,7 @@ std::uint32_t moduleStamp(void* module) noexcept {
 }
 
 bool isModuleLoaded(void* module) noexcept {
-    if (module == dlopen(nullptr, RTLD_NOW)) return true;
+    if (module == mainProgram()) return true;
     std::vector<std::string> names;
     try {
         dl_iterate_phdr(

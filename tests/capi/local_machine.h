@@ -19,6 +19,7 @@
 
 #include "child_process.h"
 #include "device_daemon.h"
+#include "machine_command.h"
 
 namespace localmachine {
 
@@ -60,10 +61,7 @@ public:
     LocalMachine& operator=(const LocalMachine&) = delete;
 
     // Runs the machine command on this machine; its output is discarded.
-    void machine(const std::string& arguments) {
-        const std::string command = std::string(TIKTAL_MACHINE) + " " + arguments + " > /dev/null";
-        ASSERT_EQ(std::system(command.c_str()), 0) << command;
-    }
+    void machine(const std::string& arguments) { tiktaltest::runMachineCommand(arguments); }
     std::string dataDirectory() const { return _root + "/var/lib/Korvane/tiktal"; }
 
     std::string _root;

@@ -11,14 +11,15 @@ import datetime
 import json
 import os
 import re
-import select
 import subprocess
+import sys
 import tempfile
 import unittest
-import urllib.request
+
+sys.path.insert(0, os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", "support"))
+from stand_ins import Machine, Simulator  # noqa: E402
 
 COMMAND = os.environ["TIKTAL_COMMAND"]
-SIMULATOR = os.environ["TIMESERVICE_SIM"]
 TRACE = "SyncTestInternal___"
 TRACE_LINE = re.compile(r"^\[iktal_impl\|", re.M)
 
@@ -40,44 +41,6 @@ def messages():
 
 
 MESSAGES = messages()
-
-
-class Simulator:
-    """timeservice_sim on 127.0.0.2 with a port of its choice and a state file in a fresh folder."""
-
-    def __init__(self):
-        self.folder = tempfile.TemporaryDirectory()
-        self.state_file = os.path.join(self.folder.name, "state.json")
-        self.process = subprocess.Popen([SIMULATOR, "--listen", "127.0.0.2:0", "--state", self.state_file],
-                                        stdout=subprocess.PIPE, text=True)
-        ready, _, _ = select.select([self.process.stdout], [], [], 60)
-        line = self.process.stdout.readline() if ready else ""
-        match = re.fullmatch(r"listening on (127\.0\.0\.2:\d+)\n", line)
-        if not match:
-            self.stop()
-            raise RuntimeError(f"the simulator did not start: {line!r}")
-        self.address = match.group(1)
-        self.resource = f"sync://{self.address}/sync_1"
-        # No proxy from the environment may stand between the test and the simulator.
-        self.opener = urllib.request.build_opener(urllib.request.ProxyHandler({}))
-
-    def control(self, path, body=None):
-        """GET /_sim/PATH, or POST it with a JSON body; the JSON answer."""
-        data = None if body is None else json.dumps(body).encode()
-        request = urllib.request.Request(f"http://{self.address}/_sim/{path}", data=data,
-                                         headers={"Content-Type": "application/json"})
-        with self.opener.open(request, timeout=60) as answer:
-            text = answer.read()
-        return json.loads(text) if text.strip() else None
-
-    def served(self):
-        return self.control("stats")["served"]
-
-    def stop(self):
-        self.process.terminate()
-        self.process.wait(timeout=60)
-        self.process.stdout.close()
-        self.folder.cleanup()
 
 
 class CommandTest(unittest.TestCase):
@@ -336,18 +299,12 @@ class LocalDevicesTest(CommandTest):
         self.root = self.folder.name
         self.saved = os.environ.get("TIKTAL_SYSROOT")
         os.environ["TIKTAL_SYSROOT"] = self.root
-        self.machine("create", self.root, '{"chassis":[{"number":1,"slots":{"2":{"serial":"c0ffee"},"4":{"device":"0x7406"}}}]}')
-        self.machine("fake", self.root, "board1")
-        self.machine("start-daemons", self.root)
+        self.machine = Machine(self.root)
 
     def tearDown(self):
-        self.machine("stop-daemons", self.root)
+        self.machine.stop()
         os.environ["TIKTAL_SYSROOT"] = self.saved
         self.folder.cleanup()
-
-    def machine(self, *args):
-        subprocess.run([os.environ["TIKTAL_MACHINE"], *args], check=True, stdout=subprocess.DEVNULL,
-                       stderr=subprocess.DEVNULL, timeout=60)
 
     def test_devices_in_both_forms(self):
         lines = self.succeed("devices").splitlines()

@@ -19,6 +19,7 @@
 #include "config/sync_attribute_provider.h"
 #include "config_test_support.h"
 #include "forked.h"
+#include "machine_command.h"
 
 namespace {
 
@@ -58,10 +59,7 @@ private:
 
 class DeviceListProcesses : public ::testing::Test {
 protected:
-    void machine(const std::string& arguments) {
-        const std::string command = std::string(TIKTAL_MACHINE) + " " + arguments + " > /dev/null";
-        ASSERT_EQ(std::system(command.c_str()), 0) << command;
-    }
+    void machine(const std::string& arguments) { tiktaltest::runMachineCommand(arguments); }
 
     // Reads the file as it is now, without its lock (it is only ever replaced whole), and checks
     // it against everything seen before.

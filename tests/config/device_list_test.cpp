@@ -16,6 +16,7 @@
 #include "config/sync_attribute_provider.h"
 #include "config_test_support.h"
 #include "json/zrjsonlh.h"
+#include "machine_command.h"
 
 namespace {
 
@@ -26,10 +27,7 @@ std::string printed(const cJSON* item) { return zrjsonlh::printUnformatted(item)
 class DeviceList : public ::testing::Test {
 protected:
     // Runs the machine command on this test's machine; its output is discarded.
-    void machine(const std::string& arguments) {
-        const std::string command = std::string(TIKTAL_MACHINE) + " " + arguments + " > /dev/null";
-        ASSERT_EQ(std::system(command.c_str()), 0) << command;
-    }
+    void machine(const std::string& arguments) { tiktaltest::runMachineCommand(arguments); }
     void create(const std::string& layout) { machine("create " + _root.root() + " '" + layout + "'"); }
 
     // The configured and provided attributes of the device with `alias`, printed.

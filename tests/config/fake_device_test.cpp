@@ -20,6 +20,7 @@
 #include "forked.h"
 #include "json/zrjsonlh.h"
 #include "platform/platform.h"
+#include "machine_command.h"
 
 namespace {
 
@@ -34,10 +35,7 @@ class FakeDevices : public ::testing::Test {
 protected:
     std::string pathOf(const std::string& file) const { return _root.dataDirectory() + "/" + file; }
     void fake(const std::string& file, const std::string& text) const { configtest::writeText(pathOf(file), text); }
-    void machine(const std::string& arguments) const {
-        const std::string command = std::string(TIKTAL_MACHINE) + " " + arguments + " > /dev/null";
-        ASSERT_EQ(std::system(command.c_str()), 0) << command;
-    }
+    void machine(const std::string& arguments) const { tiktaltest::runMachineCommand(arguments); }
 
     // The device names of the data directory, each checked to be its token, path and instance id.
     static std::vector<std::string> names() {
