@@ -97,7 +97,8 @@ const std::map<std::string, Command>& commands() {
              d.directives.failNext(code(c), static_cast<std::int32_t>(integer(c, "status", -2147483648.0, 2147483647.0)), count(c));
          }},
         {"failSystemCall", [](Daemon& d, const cJSON* c, cJSON*) {
-             d.directives.failSystemCall(code(c), static_cast<int>(integer(c, "errno", 1, 4095)), count(c));
+             d.directives.failSystemCall(code(c), static_cast<int>(integer(c, "errno", 1, 4095)), count(c),
+                                         cJSON_IsTrue(cJSON_GetObjectItemCaseSensitive(c, "output")));
          }},
         {"delayNext", [](Daemon& d, const cJSON* c, cJSON*) {
              d.directives.delayNext(code(c), static_cast<int>(integer(c, "ms", 0, 3600000)), count(c));

@@ -18,9 +18,10 @@ void Directives::failNext(std::uint32_t code, std::int32_t driverStatus, int cou
     _codes[code].driverStatus = {driverStatus, count};
 }
 
-void Directives::failSystemCall(std::uint32_t code, int osError, int count) {
+void Directives::failSystemCall(std::uint32_t code, int osError, int count, bool withOutput) {
     std::lock_guard<std::mutex> guard(_lock);
     _codes[code].osError = {osError, count};
+    _codes[code].osErrorWithOutput = withOutput;
 }
 
 void Directives::delayNext(std::uint32_t code, int milliseconds, int count) {
@@ -42,6 +43,7 @@ Action Directives::take(std::uint32_t code) {
     action.close = use<bool>(pending.close);
     action.delayMs = use<int>(pending.delayMs);
     action.osError = use<int>(pending.osError);
+    action.osErrorWithOutput = action.osError != 0 && pending.osErrorWithOutput;
     action.driverStatus = use<std::int32_t>(pending.driverStatus);
     return action;
 }

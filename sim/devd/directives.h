@@ -15,13 +15,14 @@ struct Action {
     bool close = false;           // read the request, then close the connection without answering
     int delayMs = 0;              // wait this long before answering
     int osError = 0;              // answer this OS error with no output, the request not carried out
+    bool osErrorWithOutput = false;  // ... unless this: carried out, its output beside the error
     std::int32_t driverStatus = 0;  // answer this driver status, the request not carried out
 };
 
 class Directives {
 public:
     void failNext(std::uint32_t code, std::int32_t driverStatus, int count);
-    void failSystemCall(std::uint32_t code, int osError, int count);
+    void failSystemCall(std::uint32_t code, int osError, int count, bool withOutput = false);
     void delayNext(std::uint32_t code, int milliseconds, int count);
     void closeOnNext(std::uint32_t code, int count);
 
@@ -37,6 +38,7 @@ private:
     struct ForCode {
         Pending<std::int32_t> driverStatus;
         Pending<int> osError;
+        bool osErrorWithOutput = false;
         Pending<int> delayMs;
         Pending<bool> close;
     };

@@ -71,11 +71,11 @@ bool answerWait(Daemon& daemon, int fd, const Request& request, bool refuse) {
     return send(fd, wait->outcome() == Outcome::Signalled ? 0 : ECANCELED);
 }
 
-bool answerTable(Daemon& daemon, int fd, const Request& request, std::int32_t driverStatus) {
-    if (driverStatus != 0) return send(fd, 0, failedOutput(request, driverStatus));
+bool answerTable(Daemon& daemon, int fd, const Request& request, std::int32_t driverStatus, int osError) {
+    if (driverStatus != 0) return send(fd, osError, failedOutput(request, driverStatus));
     const Bytes output = daemon.device.perform(request);
     if (request.code == kResetDeviceCode) daemon.waits.cancelAll();
-    return send(fd, 0, output);
+    return send(fd, osError, output);
 }
 
 // Answers one message; false when the connection is to end.
@@ -91,7 +91,7 @@ bool handle(Daemon& daemon, int fd, const Bytes& message) {
 
     if (action.close) return false;
     if (action.delayMs > 0 && !daemon.lifetime.sleepFor(action.delayMs)) return false;
-    if (action.osError != 0) return send(fd, action.osError);
+    if (action.osError != 0 && !action.osErrorWithOutput) return send(fd, action.osError);
     switch (request.kind) {
         case Kind::Wait: return answerWait(daemon, fd, request, action.driverStatus != 0);
         case Kind::Cancel: {
@@ -100,7 +100,7 @@ bool handle(Daemon& daemon, int fd, const Bytes& message) {
         }
         case Kind::Table: break;
     }
-    return answerTable(daemon, fd, request, action.driverStatus);
+    return answerTable(daemon, fd, request, action.driverStatus, action.osError);
 }
 
 }  // namespace

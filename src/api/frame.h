@@ -7,6 +7,7 @@
 #include <string>
 
 #include "api/globals.h"
+#include "errors/call_record.h"
 #include "errors/zrerr.h"
 
 namespace tiktal {
@@ -14,6 +15,7 @@ namespace tiktal {
 // Runs `body` and turns whatever it raises into a status.
 template <class Body>
 ViStatus guard(Body&& body) noexcept {
+    const zrerr::CallEntry entry;
     try {
         return body();
     } catch (const zrerr::ExceptionBase& e) {

@@ -10,6 +10,26 @@
 
 namespace zrerr {
 
+// The exceptions in flight on this thread when the export call running on it began. A call that
+// finds more in flight runs in a destructor while one of its own failures unwinds; an
+// application's exceptions (a call from its destructor during its unwinding) are not counted.
+inline thread_local int exceptionsAtEntry = 0;
+
+// Marks the start of an export call on this thread, and its end.
+class CallEntry {
+public:
+    CallEntry() noexcept : _outer(exceptionsAtEntry) { exceptionsAtEntry = std::uncaught_exceptions(); }
+    ~CallEntry() { exceptionsAtEntry = _outer; }
+    CallEntry(const CallEntry&) = delete;
+    CallEntry& operator=(const CallEntry&) = delete;
+
+private:
+    int _outer;
+};
+
+// Whether a failure of this call is unwinding now.
+inline bool unwindingThisCall() noexcept { return std::uncaught_exceptions() > exceptionsAtEntry; }
+
 // The parts that do not depend on the record's type.
 namespace record {
 // Room for `wanted` bytes of text, the text kept; 0 frees it; above 0x7FFFFFFF fails. 1 or 0.
@@ -34,12 +54,13 @@ public:
     Record* get() noexcept { return &_record; }
 
     // Calls `function` with a fresh record as its last argument, then raises what the record
-    // holds, unless an exception is already propagating (a call made while unwinding).
+    // holds, unless a failure of this export call is already propagating (a call made from a
+    // destructor while it unwinds).
     template <class Function, class... Args>
     static auto call(Function&& function, Args&&... args) {
         CallRecord status;
         const auto checkUnlessUnwinding = [&status] {
-            if (std::uncaught_exceptions() == 0) status.check();
+            if (!unwindingThisCall()) status.check();
         };
         if constexpr (std::is_void_v<decltype(function(std::forward<Args>(args)..., status.get()))>) {
             function(std::forward<Args>(args)..., status.get());

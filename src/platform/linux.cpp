@@ -120,7 +120,7 @@ constexpr OsErrorRow kOsErrors[] = {
     {ENOENT, -52006},     {ENODEV, -52006},   {ENXIO, -52006},          // 2 no such device
     {ECONNREFUSED, -52006},                                             //   (no driver behind the path)
     {ETIMEDOUT, -52007},                                                // 121, 258 time-out
-    {EPROTO, -52008},                                                   // 1359 internal error (a malformed answer)
+    {EPROTO, -52008},     {EBADMSG, -52008},                            // 1359 internal error (a malformed answer)
     {EACCES, -52009},     {EPERM, -52009},                              // 5 access denied
     {ENODATA, -52012},                                                  // 38 end of data
     {EEXIST, -52013},                                                   // 183 already exists
@@ -425,8 +425,12 @@ int connectTo(const std::string& path, int& error) {
         error = errno;
         return -1;
     }
+    // A driver that accepts nothing (stopped, its backlog full) would hold connect without end;
+    // the send time limit bounds it, and then sending, as the answer limit bounds receiving.
+    const timeval limit{kAnswerSeconds, 0};
+    ::setsockopt(socket, SOL_SOCKET, SO_SNDTIMEO, &limit, sizeof limit);
     if (::connect(socket, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
-        error = errno;
+        error = errno == EAGAIN ? ETIMEDOUT : errno;
         ::close(socket);
         return -1;
     }
@@ -440,8 +444,10 @@ int sendRequest(int socket, std::uint32_t code, const void* in, std::uint32_t in
     putU32(message.data(), code);
     putU32(message.data() + 4, outSize);
     if (inSize > 0) std::memcpy(message.data() + kHeaderSize, in, inSize);
-    const ssize_t sent = ::send(socket, message.data(), message.size(), MSG_NOSIGNAL);
-    if (sent < 0) return errno;
+    ssize_t sent;
+    do sent = ::send(socket, message.data(), message.size(), MSG_NOSIGNAL);
+    while (sent < 0 && errno == EINTR);
+    if (sent < 0) return errno == EAGAIN || errno == EWOULDBLOCK ? ETIMEDOUT : errno;
     return static_cast<std::size_t>(sent) == message.size() ? 0 : EPROTO;
 }
 
@@ -460,6 +466,8 @@ int receiveAnswer(int socket, void* out, std::uint32_t outSize, std::uint32_t& r
         return EPROTO;
     const std::int32_t error = static_cast<std::int32_t>(getU32(message.data()));
     if (error < 0 || error > 4095) return EPROTO;
+    // An answer is final: a driver that calls it pending has answered nothing that can be used.
+    if (error == EAGAIN || error == EINPROGRESS) return EBADMSG;
     if (size > 0) std::memcpy(out, message.data() + kHeaderSize, size);
     returned = size;
     return error;

@@ -147,8 +147,9 @@ void DeviceDaemon::failNext(std::uint32_t code, std::int32_t driverStatus, int c
     control(command("failNext", member("code", code) + "," + member("status", driverStatus) + "," + member("count", count)));
 }
 
-void DeviceDaemon::failSystemCall(std::uint32_t code, int osError, int count) {
-    control(command("failSystemCall", member("code", code) + "," + member("errno", osError) + "," + member("count", count)));
+void DeviceDaemon::failSystemCall(std::uint32_t code, int osError, int count, bool withOutput) {
+    control(command("failSystemCall", member("code", code) + "," + member("errno", osError) + "," + member("count", count) +
+                                          (withOutput ? ",\"output\":true" : "")));
 }
 
 void DeviceDaemon::delayNext(std::uint32_t code, int milliseconds) {

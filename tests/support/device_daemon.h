@@ -46,7 +46,8 @@ public:
     void failNext(std::uint32_t code, std::int32_t driverStatus, int count = 1);
     // The next `count` requests of `code` answer the OS error `osError` (an errno value) with no
     // output, and are not carried out.
-    void failSystemCall(std::uint32_t code, int osError, int count = 1);
+    // With `withOutput`, the requests are carried out and answer the error beside their output.
+    void failSystemCall(std::uint32_t code, int osError, int count = 1, bool withOutput = false);
     // The answer of the next request of `code` waits `milliseconds` first.
     void delayNext(std::uint32_t code, int milliseconds);
     // The next request of `code` is read, then its connection is closed without an answer.
