@@ -32,7 +32,7 @@ template <class Operation>
 ViStatus forward(ViSession vi, Operation&& operation) noexcept {
     return guard([&] {
         checkGlobalInit();
-        const std::shared_ptr<Session> session = globals().sessionDB.getSession(vi);
+        const SessionDB::Held session(globals().sessionDB, vi);
         operation(*session);
         return VI_SUCCESS;
     });

@@ -35,27 +35,46 @@ ViSession SessionDB::addSession(std::shared_ptr<Session> session) {
         if (shard.sessions.count(_nextId) != 0) continue;
         const ViSession id = _nextId;
         session->id = id;
-        shard.sessions.emplace(id, std::move(session));
+        shard.sessions.emplace(id, Entry{std::move(session)});
         _nextId = following(id);
         return id;
     }
 }
 
-std::shared_ptr<Session> SessionDB::getSession(ViSession id) {
-    Shard& shard = shardOf(id);
+SessionDB::Held::Held(SessionDB& registry, ViSession id) : _shard(registry.shardOf(id)), _entry(nullptr) {
     {
-        const ShardGuard hold(shard.lock);
-        const auto found = shard.sessions.find(id);
-        if (found != shard.sessions.end()) return found->second;
+        const ShardGuard hold(_shard.lock);
+        const auto found = _shard.sessions.find(id);
+        if (found != _shard.sessions.end() && !found->second.closed) {
+            _entry = &found->second;
+            ++_entry->calls;
+            return;
+        }
     }
     throw ZRERR_RAISE(tiktalerr_invalidObject).debug("msg", "SessionDB::getSession: id not found").debug("id", id);
 }
 
+SessionDB::Held::~Held() {
+    std::map<ViSession, Entry>::node_type ended;
+    {
+        const ShardGuard hold(_shard.lock);
+        if (--_entry->calls == 0 && _entry->closed) ended = _shard.sessions.extract(_entry->session->id);
+    }
+    // `ended` destroys the session here, outside the lock.
+}
+
 void SessionDB::removeSession(ViSession id) {
-    // Every shard, in order, so that the destructor of a session owned last by the registry runs
-    // before any other lookup, addition or removal.
+    // Every shard, in order, so that the destructor of a session that no call holds runs before
+    // any other lookup, addition or removal.
     for (Shard& shard : _shards) shard.lock.lock();
-    shardOf(id).sessions.erase(id);
+    auto& sessions = shardOf(id).sessions;
+    const auto found = sessions.find(id);
+    if (found != sessions.end()) {
+        if (found->second.calls == 0)
+            sessions.erase(found);
+        else
+            found->second.closed = true;
+    }
     for (auto shard = _shards.rbegin(); shard != _shards.rend(); ++shard) shard->lock.unlock();
 }
 

@@ -33,24 +33,49 @@ inline constexpr std::size_t kCacheLinePair = 128;
 // The registry of open sessions, split by handle into shards that each have their own lock and
 // map, so that calls on different sessions look their handles up without meeting on one lock.
 // Issuing a handle takes the counter's lock, then the lock of the new handle's shard. Closing
-// takes the lock of every shard: a session that the registry owned last is destroyed while all
-// of them are held, so no lookup proceeds until its destructor has returned.
+// takes the lock of every shard: a session that no call holds is destroyed while all of them are
+// held, so no lookup proceeds until its destructor has returned. A session closed during calls
+// is gone for lookups at once and destroyed by the last of those calls as it ends.
 class SessionDB {
+    struct Entry;
+    struct Shard;
+
 public:
     explicit SessionDB(nZRAPALS100::tStatus& initStatus) noexcept;
 
     ViSession addSession(std::shared_ptr<Session> session);
-    std::shared_ptr<Session> getSession(ViSession id);
     void removeSession(ViSession id);
+
+    // The session of a handle, held for one call: found, or tiktalerr_invalidObject. Each call
+    // counts itself in the registry under its shard's lock, which takes as many atomic operations
+    // as sharing the session's ownership would, and makes the lookup cost none of its own.
+    class Held {
+    public:
+        Held(SessionDB& registry, ViSession id);
+        ~Held();
+        Held(const Held&) = delete;
+        Held& operator=(const Held&) = delete;
+        Session& operator*() const noexcept { return *_entry->session; }
+
+    private:
+        Shard& _shard;
+        Entry* _entry;  // stays in its map while it counts this call
+    };
 
 private:
     static constexpr std::size_t kShards = 16;
+
+    struct Entry {
+        std::shared_ptr<Session> session;
+        std::uint32_t calls = 0;  // calls holding it now
+        bool closed = false;      // closed while held: gone for lookups, ended by the last call
+    };
 
     // Lookups in different shards write no memory in common. A lookup holds its shard's lock for
     // a few instructions only, so a spin lock serves it with half the atomic operations of a mutex.
     struct alignas(kCacheLinePair) Shard {
         support::SpinLock lock;
-        std::map<ViSession, std::shared_ptr<Session>> sessions;
+        std::map<ViSession, Entry> sessions;
     };
     using ShardGuard = std::lock_guard<support::SpinLock>;
 

@@ -15,16 +15,25 @@ namespace zrerr {
 // application's exceptions (a call from its destructor during its unwinding) are not counted.
 inline thread_local int exceptionsAtEntry = 0;
 
-// Marks the start of an export call on this thread, and its end.
+// Marks the start of an export call on this thread, and its end. Mostly none is in flight at the
+// start, and the count in place is 0 already (a call that is not nested finds 0, a nested one no
+// less than its outer call's), so only a call made during unwinding writes it.
 class CallEntry {
 public:
-    CallEntry() noexcept : _outer(exceptionsAtEntry) { exceptionsAtEntry = std::uncaught_exceptions(); }
-    ~CallEntry() { exceptionsAtEntry = _outer; }
+    CallEntry() noexcept : _entered(std::uncaught_exceptions()) {
+        if (_entered == 0) return;
+        _outer = exceptionsAtEntry;
+        exceptionsAtEntry = _entered;
+    }
+    ~CallEntry() {
+        if (_entered != 0) exceptionsAtEntry = _outer;
+    }
     CallEntry(const CallEntry&) = delete;
     CallEntry& operator=(const CallEntry&) = delete;
 
 private:
-    int _outer;
+    int _entered;
+    int _outer = 0;
 };
 
 // Whether a failure of this call is unwinding now.
