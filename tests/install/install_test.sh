@@ -1,14 +1,17 @@
 #!/usr/bin/env bash
-# Installs the build into a temporary prefix, builds the examples against it with pkg-config and
-# with the CMake package, and runs them against the installed time-service simulator; so does the
-# Python package installed with them, with the Python the build was configured with.
+# Installs the build into a temporary prefix: no stand-in by default, each in a folder of its own
+# off the loader's path with the component "simulators". Builds the examples against it with
+# pkg-config and with the CMake package, and runs them against the installed time-service
+# simulator; so does the Python package installed with them, with the Python the build was
+# configured with. The installed machine command and tiktal command find the installed stand-ins.
 # Usage: install_test.sh BUILD_DIR SOURCE_DIR
 set -euo pipefail
 build=$1
 source=$2
 work=$(mktemp -d)
 . "$source/scripts/simulator.sh"
-trap 'stop_simulator; rm -rf "$work"' EXIT
+machine=$work/machine
+trap 'stop_simulator; [ ! -d "$machine" ] || "$prefix/libexec/tiktal/tiktal-machine" stop-daemons "$machine"; rm -rf "$work"' EXIT
 fail() { echo "FAIL: $*" >&2; exit 1; }
 expect() {  # expect FILE TEXT: the output holds the text
   grep -qF -- "$2" "$1" || { cat "$1" >&2; fail "$1 lacks: $2"; }
@@ -22,6 +25,21 @@ libdir=$(dirname "$(find "$prefix" -name 'libtiktal.so' | head -n 1)")
 for runtime in zrssl/libzrsslinit.so zrcurl/libcurlimpl.so; do
   [ -f "$libdir/tiktal/$runtime" ] || fail "run-time library $runtime not installed"
 done
+[ -f "$prefix/include/tiktal/tiktal.h" ] && [ -x "$prefix/bin/tiktal" ] || fail "no header or no tiktal command"
+
+# The stand-ins carry the real libraries' names: none by default, and with the component only
+# these, where no loader looks by default (nothing of them in lib/, lib/<multiarch>, lib64, bin/).
+stand_ins() {
+  find "$prefix" \( -name 'libzrrocoapi*' -o -name 'libzrqpxi*' -o -name 'libgrrt*' -o -name 'libgrffrt*' \
+    -o -name timeservice_sim -o -name tiktal_devd -o -name tiktal-machine \) -printf '%P\n' | LC_ALL=C sort
+}
+[ -z "$(stand_ins)" ] || fail "stand-ins installed by default: $(stand_ins)"
+cmake --install "$build" --prefix "$prefix" --component simulators >/dev/null
+sim=${libdir#"$prefix"/}/tiktal/sim
+expected=$(printf '%s\n' "$sim/libzrrocoapi.so" "$sim/libzrqpxi.so" "$sim/graviton/libgrrt.so" \
+  "$sim/graviton/libgrffrt.so" libexec/tiktal/timeservice_sim libexec/tiktal/tiktal_devd \
+  libexec/tiktal/tiktal-machine | LC_ALL=C sort)
+[ "$(stand_ins)" = "$expected" ] || fail "stand-ins installed as: $(stand_ins)"
 
 # pkg-config
 export PKG_CONFIG_PATH=$libdir/pkgconfig
@@ -39,7 +57,7 @@ cmake -S "$source/tests/install/app" -B "$work/cmake" -DCMAKE_PREFIX_PATH="$pref
 cmake --build "$work/cmake" >/dev/null
 
 # The installed simulator, and the examples of both builds against it.
-start_simulator "$prefix/bin/timeservice_sim" "$work/state.json"
+start_simulator "$prefix/libexec/tiktal/timeservice_sim" "$work/state.json"
 address=$sim_address
 export ZRSHAREDDIR=$libdir/tiktal
 
@@ -59,6 +77,13 @@ done
 expect "$work/out" "TAB1  IEEE 802.1AS-2011 TAB"
 "$work/pc/time_references" "sync://localhost/system" >"$work/out" 2>&1 && fail "localhost was accepted"
 expect "$work/out" "tiktal_init failed: 0xBFFA4016 The specified device was not found."
+
+# A simulated machine from the installed tree: the machine command starts the daemon beside it, and
+# the library reaches the chassis query and routing stand-ins through LD_LIBRARY_PATH.
+env -u TIKTAL_DEVD "$prefix/libexec/tiktal/tiktal-machine" create "$machine" '{"chassis":[{"number":1,"slots":{"2":{}}}]}'
+env -u TIKTAL_DEVD "$prefix/libexec/tiktal/tiktal-machine" start-daemons "$machine"
+TIKTAL_SYSROOT=$machine LD_LIBRARY_PATH=$libdir/tiktal/sim "$prefix/bin/tiktal" route PXI1Slot2 PFI0 PXI_Trig3 \
+  >"$work/out" 2>&1 || { cat "$work/out"; fail "tiktal route on the installed stand-ins"; }
 echo "install test passed"
 
 # The Python package: the install says where it went (a temporary prefix is on no Python's path),
