@@ -16,8 +16,9 @@ public:
     // Called after each save with the data that was saved.
     using SaveCallback = std::function<void(const ConfigurationData&)>;
 
-    // Takes the file's lock (waiting for other threads and processes), which it holds until it
-    // is destroyed: reading, merging and writing are one step for every process.
+    // Takes the file's lock (waiting for other threads and processes, at most
+    // LockableFile::kLockWait), which it holds until it is destroyed: reading, merging and
+    // writing are one step for every process.
     explicit Configuration(LockableFile& file, SaveCallback onSave = {});
     ~Configuration();
     Configuration(const Configuration&) = delete;

@@ -24,6 +24,7 @@ struct Status {
 };
 
 inline constexpr Status kResourceNotFound{-52006, "nZRAPALS100::tStatus::kResourceNotFound"};
+inline constexpr Status kTimeout{-52007, "zrapalerr_timeout"};
 inline constexpr Status kOsFault{-52008, "zrapalerr_osFault"};
 inline constexpr Status kEndOfData{-52012, "nZRAPALS100::tStatus::kEndOfData"};
 inline constexpr Status kObjectNameCollision{-52013, "zrapalerr_objectNameCollision"};

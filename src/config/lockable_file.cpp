@@ -1,6 +1,8 @@
 #include "config/lockable_file.h"
 
+#include <algorithm>
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
 
 #include "config/failure.h"
@@ -14,6 +16,27 @@ std::string folderOf(const std::string& path) {
     const std::size_t slash = path.rfind('/');
     if (slash == std::string::npos) return ".";
     return slash == 0 ? "/" : path.substr(0, slash);
+}
+
+// What stands in the way of opening `path`, which failed with `error`; "" when the error says it.
+std::string whatIsWrong(const std::string& path, int error) {
+    std::string target;
+    switch (error) {
+    case EISDIR: return "The path is a folder";
+    case EINVAL: return "The path is not a regular file";
+    case ELOOP: return "The path leads through too many levels of links (a loop of links)";
+    case ENOTDIR: return "A part of the path on the way to the file is not a folder";
+    case ENOENT:
+        if (!platform::readLink(path, target)) return "The path is a dangling link to " + target;
+        return "";
+    default: return "";
+    }
+}
+
+std::string secondsText(std::chrono::milliseconds time) {
+    char text[32];
+    std::snprintf(text, sizeof text, "%g s", static_cast<double>(time.count()) / 1000);
+    return text;
 }
 
 }  // namespace
@@ -45,19 +68,27 @@ void LockableFile::open() {
                 .raise();
         error = _file.open(_path, _create);
     }
-    if (error)
-        ZRJSONCONFIG_FAILURE(kResourceNotFound)
-            .usage(kUsageTypeFilePath, _path)
-            .comment("Failed to open file")
-            .osError(error)
-            .raise();
+    if (error) {
+        Failure failure = ZRJSONCONFIG_FAILURE(kResourceNotFound);
+        failure.usage(kUsageTypeFilePath, _path).comment("Failed to open file").osError(error);
+        const std::string wrong = whatIsWrong(_path, error.code);
+        if (!wrong.empty()) failure.comment(wrong);
+        failure.raise();
+    }
 }
 
-void LockableFile::lock() {
+void LockableFile::lock(std::chrono::milliseconds limit) {
+    using Clock = std::chrono::steady_clock;
     std::unique_lock<std::mutex> threads(_threads);
+    const Clock::time_point deadline = Clock::now() + limit;
     for (;;) {
-        if (const platform::OsError error = _file.lock())
-            ZRJSONCONFIG_FAILURE(kOsFault).usage(kUsageTypeFilePath, _path).comment("Failed to lock file").osError(error).raise();
+        const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(deadline - Clock::now());
+        if (const platform::OsError error = _file.lock(std::max(left, std::chrono::milliseconds(0)))) {
+            Failure failure = ZRJSONCONFIG_FAILURE(error.code == ETIMEDOUT ? kTimeout : kOsFault);
+            failure.usage(kUsageTypeFilePath, _path).comment("Failed to lock file").osError(error);
+            if (error.code == ETIMEDOUT) failure.comment("Another process held a lock on the file for " + secondsText(limit));
+            failure.raise();
+        }
         bool current = false;
         if (const platform::OsError error = _file.namesPath(current))
             ZRJSONCONFIG_FAILURE(kOsFault).usage(kUsageTypeFilePath, _path).comment("Failed to lock file").osError(error).raise();
@@ -92,6 +123,13 @@ std::string LockableFile::read() {
 }
 
 void LockableFile::write(const std::string& text) {
+    if (text.size() > kMaxSize)
+        ZRJSONCONFIG_FAILURE(kEndOfData)
+            .usage(kUsageTypeFilePath, _path)
+            .comment("Failed to write file")
+            .comment("The new text of " + std::to_string(text.size()) + " bytes is larger than 16 MiB, which no process reads")
+            .osError({"write", EFBIG})
+            .raise();
     if (const platform::OsError error = _file.replace(text)) {
         const bool flushing = std::strcmp(error.api, "fsync") == 0;
         ZRJSONCONFIG_FAILURE(kEndOfData)

@@ -19,6 +19,7 @@
 #include <algorithm>
 #include <climits>
 #include <pthread.h>
+#include <thread>
 #include <unistd.h>
 #include <vector>
 
@@ -174,24 +175,32 @@ OsError makeDirectories(const std::string& path) {
 
 namespace {
 
-// Sets or clears the lock over the whole file (start 0, length 0: to the end, however it grows).
+// Sets or clears the lock over the whole file (start 0, length 0: to the end, however it grows)
+// without waiting: EAGAIN when another open file holds a lock in the way.
 OsError setWholeFileLock(int descriptor, short type) noexcept {
     struct flock range {};
     range.l_type = type;
     range.l_whence = SEEK_SET;
     range.l_start = 0;
     range.l_len = 0;
-    while (::fcntl(descriptor, F_OFD_SETLKW, &range) != 0)
+    while (::fcntl(descriptor, F_OFD_SETLK, &range) != 0) {
+        if (errno == EACCES) return {"fcntl", EAGAIN};  // the other answer POSIX allows for a conflict
         if (errno != EINTR) return {"fcntl", errno};
+    }
     return {};
 }
 
+// The longest pause between two tries to take a lock that another open file holds.
+constexpr std::chrono::milliseconds kLongestLockPause{10};
+
+// Writes the whole of `data` from the start of the file.
 OsError writeAll(int descriptor, const char* data, std::size_t size) noexcept {
-    while (size > 0) {
-        const ssize_t written = ::write(descriptor, data, size);
+    for (off_t offset = 0; size > 0;) {
+        const ssize_t written = ::pwrite(descriptor, data, size, offset);
         if (written < 0 && errno == EINTR) continue;
         if (written < 0) return {"write", errno};
         data += written;
+        offset += written;
         size -= static_cast<std::size_t>(written);
     }
     return {};
@@ -213,9 +222,21 @@ File::~File() { close(); }
 OsError File::open(const std::string& path, bool create) {
     close();
     // Without O_EXCL, opening and creating are one step: of several processes that find the file
-    // missing at once, one creates it and the others open what it created.
-    const int descriptor = ::open(path.c_str(), O_RDWR | O_CLOEXEC | (create ? O_CREAT : 0), 0666);
+    // missing at once, one creates it and the others open what it created. A link that leads
+    // nowhere is followed too: the file is created where the link points, as every later write
+    // rewrites the link's target and leaves the link. O_NONBLOCK: a device or a pipe put in the
+    // file's place must not hold the opener up before it is refused.
+    const int descriptor =
+        ::open(path.c_str(), O_RDWR | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | (create ? O_CREAT : 0), 0666);
     if (descriptor < 0) return {"open", errno};
+    struct stat status {};
+    OsError error;
+    if (::fstat(descriptor, &status) != 0) error = {"fstat", errno};
+    else if (!S_ISREG(status.st_mode)) error = {"open", EINVAL};
+    if (error) {
+        ::close(descriptor);
+        return error;
+    }
     _descriptor = descriptor;
     _path = path;
     return {};
@@ -227,10 +248,19 @@ void File::close() noexcept {
     _locked = false;
 }
 
-OsError File::lock() noexcept {
-    const OsError error = setWholeFileLock(_descriptor, F_WRLCK);
-    if (!error) _locked = true;
-    return error;
+// Tried again after growing pauses rather than waited for in the kernel, whose wait only a signal
+// could end before the lock is free.
+OsError File::lock(std::chrono::milliseconds limit) noexcept {
+    using Clock = std::chrono::steady_clock;
+    const Clock::time_point deadline = Clock::now() + limit;
+    for (std::chrono::milliseconds pause{1};; pause = std::min(2 * pause, kLongestLockPause)) {
+        const OsError error = setWholeFileLock(_descriptor, F_WRLCK);
+        if (!error) _locked = true;
+        if (error.code != EAGAIN) return error;
+        const Clock::time_point now = Clock::now();
+        if (now >= deadline) return {"fcntl", ETIMEDOUT};
+        std::this_thread::sleep_for(std::min<Clock::duration>(pause, deadline - now));
+    }
 }
 
 OsError File::unlock() noexcept {
@@ -362,30 +392,59 @@ OsError File::readAll(std::size_t limit, std::string& text) {
     return {};
 }
 
+namespace {
+
+// The file `path` names, every link followed, on the way and at the end.
+OsError realPath(const std::string& path, std::string& real) {
+    const std::unique_ptr<char, void (*)(void*)> resolved(::realpath(path.c_str(), nullptr), std::free);
+    if (!resolved) return {"realpath", errno};
+    real = resolved.get();
+    return {};
+}
+
+// Whether a failure to make or rename a file in a folder says that this process may not change
+// the folder's entries (EPERM: in a folder with the sticky bit, the file belongs to another user).
+bool mayNotChangeFolder(int error) noexcept { return error == EACCES || error == EPERM; }
+
+// Gives the new file the owner, group and mode of the old one. A process that may not give a file
+// away (EPERM), or cannot name the old owner in its user namespace (EINVAL), keeps the file as its
+// own. The mode comes last: changing the owner clears the set-user and set-group bits.
+OsError takeOver(int descriptor, const struct stat& old) noexcept {
+    if (::fchown(descriptor, old.st_uid, old.st_gid) != 0 && errno != EPERM && errno != EINVAL) return {"fchown", errno};
+    if (::fchmod(descriptor, old.st_mode & 07777) != 0) return {"fchmod", errno};
+    return {};
+}
+
+}  // namespace
+
 OsError File::replace(const std::string& text) {
-    const std::size_t slash = _path.rfind('/');
-    const std::string folder = slash == std::string::npos ? "." : slash == 0 ? "/" : _path.substr(0, slash);
-    const std::string name = slash == std::string::npos ? _path : _path.substr(slash + 1);
+    std::string real;
+    if (OsError error = realPath(_path, real)) return error;
+    const std::size_t slash = real.rfind('/');  // a real path is absolute
+    const std::string folder = slash == 0 ? "/" : real.substr(0, slash);
+    const std::string name = real.substr(slash + 1);
     if (_locked) removeLeftovers(folder, name);
     // A hidden name of its own in the same folder: a rename within one file system is atomic.
     std::string temporary = folder + "/." + name + ".XXXXXX";
     const int descriptor = ::mkostemp(temporary.data(), O_CLOEXEC);
-    if (descriptor < 0) return {"mkostemp", errno};
+    if (descriptor < 0) return mayNotChangeFolder(errno) ? rewriteInPlace(text) : OsError{"mkostemp", errno};
     auto fail = [&](OsError error) {
         ::close(descriptor);
         ::unlink(temporary.c_str());
         return error;
     };
-    // The new file keeps the permissions of the one it replaces (mkostemp creates it 0600).
     struct stat old {};
     if (::fstat(_descriptor, &old) != 0) return fail({"fstat", errno});
-    if (::fchmod(descriptor, old.st_mode & 07777) != 0) return fail({"fchmod", errno});
+    if (OsError error = takeOver(descriptor, old)) return fail(error);
     if (_locked) {
         if (OsError error = setWholeFileLock(descriptor, F_WRLCK)) return fail(error);
     }
     if (OsError error = writeAll(descriptor, text.data(), text.size())) return fail(error);
     if (::fsync(descriptor) != 0) return fail({"fsync", errno});
-    if (::rename(temporary.c_str(), _path.c_str()) != 0) return fail({"rename", errno});
+    if (::rename(temporary.c_str(), real.c_str()) != 0) {
+        const OsError error = fail({"rename", errno});
+        return mayNotChangeFolder(error.code) ? rewriteInPlace(text) : error;
+    }
     // The path names the new file now; closing the old one ends its lock, and a process that was
     // waiting for it finds that the path names another file.
     const bool locked = _locked;
@@ -393,6 +452,13 @@ OsError File::replace(const std::string& text) {
     _descriptor = descriptor;
     _locked = locked;
     return syncFolder(folder);
+}
+
+OsError File::rewriteInPlace(const std::string& text) noexcept {
+    if (OsError error = writeAll(_descriptor, text.data(), text.size())) return error;
+    if (::ftruncate(_descriptor, static_cast<off_t>(text.size())) != 0) return {"ftruncate", errno};
+    if (::fsync(_descriptor) != 0) return {"fsync", errno};
+    return {};
 }
 
 namespace {
@@ -704,6 +770,15 @@ void fatalError(const std::string& text) noexcept {
 bool exists(const std::string& path) noexcept {
     struct stat status {};
     return ::lstat(path.c_str(), &status) == 0;
+}
+
+OsError readLink(const std::string& path, std::string& target) {
+    char buffer[PATH_MAX];
+    const ssize_t length = ::readlink(path.c_str(), buffer, sizeof buffer);
+    if (length < 0) return {"readlink", errno};
+    if (static_cast<std::size_t>(length) == sizeof buffer) return {"readlink", ENAMETOOLONG};
+    target.assign(buffer, static_cast<std::size_t>(length));
+    return {};
 }
 
 int readAttributeFile(const std::string& path, std::string& text) noexcept {

@@ -2,6 +2,7 @@
 // outside this folder includes a system header for them.
 #pragma once
 
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <initializer_list>
@@ -113,6 +114,10 @@ struct OsError {
 // The system's message text of an error number.
 std::string osErrorText(int error);
 
+// The target that the symbolic link `path` names, as the link holds it; EINVAL when `path` is no
+// link.
+OsError readLink(const std::string& path, std::string& target);
+
 // One entry of a folder: its name, and whether the entry itself is a regular file (a symbolic
 // link is not followed, so it never counts as one).
 struct DirectoryEntry {
@@ -146,15 +151,18 @@ public:
     File(const File&) = delete;
     File& operator=(const File&) = delete;
 
-    // Opens `path`; when it is missing and `create`, creates it empty.
+    // Opens `path`, links followed; when it is missing and `create`, creates it empty (at the
+    // end of a link that leads nowhere: where the link points, when that folder exists). Only a
+    // regular file is opened: anything else at the path fails with EINVAL (EISDIR for a folder).
     OsError open(const std::string& path, bool create);
     // Closes the file; its lock, if held, ends with it.
     void close() noexcept;
     bool isOpen() const noexcept { return _descriptor >= 0; }
     const std::string& path() const noexcept { return _path; }
 
-    // Waits without time limit until this open file holds the exclusive lock.
-    OsError lock() noexcept;
+    // Waits until this open file holds the exclusive lock, at most `limit`: ETIMEDOUT when other
+    // open files held a lock on it (shared or exclusive) all that time.
+    OsError lock(std::chrono::milliseconds limit) noexcept;
     OsError unlock() noexcept;
 
     // Whether the path still names this open file (same device and inode). A file replaced or
@@ -164,15 +172,22 @@ public:
     // The whole content from its start. A file longer than `limit` bytes is not read: EFBIG.
     OsError readAll(std::size_t limit, std::string& text);
 
-    // Replaces the file at the path with `text` so that every reader finds either the old or the
-    // new content, never a part: the text goes into a new file in the same folder, which is
-    // synced and renamed over the path; then the folder is synced. This object then holds the new
-    // file, locked when the old one was (the lock is taken before the rename, so no other process
-    // can take it in between). On a failure before the rename the old file stays as it was.
-    // With the lock held it first removes the new files that killed writers left behind.
+    // Replaces the file the path names (at the end of its links: a link stays a link) with `text`
+    // so that every reader finds either the old or the new content, never a part: the text goes
+    // into a new file in the same folder as that file, which gets its owner and group (where the
+    // process may give them) and its mode, is synced and renamed over it; then the folder is
+    // synced. This object then holds the new file, locked when the old one was (the lock is taken
+    // before the rename, so no other process can take it in between). On a failure before the
+    // rename the old file stays as it was. With the lock held it first removes the new files that
+    // killed writers left behind.
+    // A process that may write the file but not make or rename files in its folder rewrites it in
+    // place instead (written, cut to the new length, synced): readers that take the lock never
+    // see a part of it, but a process killed while writing leaves a part.
     OsError replace(const std::string& text);
 
 private:
+    OsError rewriteInPlace(const std::string& text) noexcept;
+
     int _descriptor = -1;
     bool _locked = false;
     std::string _path;
