@@ -1,6 +1,7 @@
 // Local devices whose driver or services misbehave, and an application that calls the library
 // from a destructor while its own exception unwinds.
 #include <cjson/cJSON.h>
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/socket.h>
@@ -17,6 +18,7 @@
 #include <vector>
 
 #include "local_machine.h"
+#include "stderr_capture.h"
 
 namespace {
 
@@ -49,6 +51,22 @@ TEST_F(LocalDeviceFailures, ADriverThatAcceptsNothingTimesTheOpenOut) {
     EXPECT_EQ(tiktal_init(const_cast<ViRsrc>("PXI1Slot4"), VI_FALSE, VI_FALSE, &vi), static_cast<ViStatus>(0xBFFA400B));
     ::kill(slot4->pid(), SIGCONT);
     for (const int s : waiting) ::close(s);
+}
+
+TEST_F(LocalDeviceFailures, AReadLockHeldByAnyoneTimesTheOpenOutNamingTheFile) {
+    const std::string path = dataDirectory() + "/tiktal.config";
+    const int reader = ::open(path.c_str(), O_RDWR | O_CREAT, 0644);
+    struct flock shared {};
+    shared.l_type = F_RDLCK;
+    ASSERT_EQ(::fcntl(reader, F_OFD_SETLK, &shared), 0);
+    testsupport::StderrCapture trace;
+    ViSession vi = 0;
+    EXPECT_EQ(tiktal_init(const_cast<ViRsrc>("PXI1Slot2"), VI_FALSE, VI_FALSE, &vi), static_cast<ViStatus>(0xBFFA400B));
+    std::string lines;
+    for (const std::string& write : trace.finish()) lines += write;
+    EXPECT_NE(lines.find("Fatal configuration error! "), std::string::npos) << lines;
+    EXPECT_NE(lines.find(path), std::string::npos) << lines;
+    ::close(reader);
 }
 
 TEST_F(LocalDeviceFailures, APendingAnswerIsAnInternalErrorAndNothingOfItIsUsed) {
