@@ -526,20 +526,25 @@ int receiveAnswer(int socket, void* out, std::uint32_t outSize, std::uint32_t& r
     while (received < 0 && errno == EINTR);
     if (received < 0) return errno == EAGAIN || errno == EWOULDBLOCK ? ETIMEDOUT : errno;
     if (received == 0) return ECONNRESET;  // the driver closed the connection
-    const std::uint32_t size = getU32(message.data() + 4);
-    if (static_cast<std::size_t>(received) < kHeaderSize || static_cast<std::size_t>(received) > message.size() ||
-        size != static_cast<std::size_t>(received) - kHeaderSize)
-        return EPROTO;
-    const std::int32_t error = static_cast<std::int32_t>(getU32(message.data()));
-    if (error < 0 || error > 4095) return EPROTO;
-    // An answer is final: a driver that calls it pending has answered nothing that can be used.
-    if (error == EAGAIN || error == EINPROGRESS) return EBADMSG;
-    if (size > 0) std::memcpy(out, message.data() + kHeaderSize, size);
-    returned = size;
-    return error;
+    return decodeDriverAnswer(message.data(), static_cast<std::size_t>(received), out, outSize, returned);
 }
 
 }  // namespace
+
+int decodeDriverAnswer(const std::uint8_t* message, std::size_t received, void* out, std::uint32_t outSize,
+                       std::uint32_t& returned) noexcept {
+    returned = 0;
+    if (received < kHeaderSize || received > kHeaderSize + outSize) return EPROTO;
+    const std::uint32_t size = getU32(message + 4);
+    if (size != received - kHeaderSize) return EPROTO;
+    const std::int32_t error = static_cast<std::int32_t>(getU32(message));
+    if (error < 0 || error > 4095) return EPROTO;
+    // An answer is final: a driver that calls it pending has answered nothing that can be used.
+    if (error == EAGAIN || error == EINPROGRESS) return EBADMSG;
+    if (size > 0) std::memcpy(out, message + kHeaderSize, size);
+    returned = size;
+    return error;
+}
 
 struct DeviceChannel::State {
     int socket = -1;

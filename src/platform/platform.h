@@ -218,6 +218,13 @@ private:
     std::unique_ptr<State> _state;
 };
 
+// Decodes one answer message of a driver (i32 error number, u32 bytes returned, the output), of
+// which `received` bytes arrived (more than the room of 8 + `outSize` bytes when it was cut):
+// 0 or the driver's error number, with the output copied into `out` and its size in `returned`;
+// EPROTO for a malformed message and EBADMSG for a pending answer, with nothing copied.
+int decodeDriverAnswer(const std::uint8_t* message, std::size_t received, void* out, std::uint32_t outSize,
+                       std::uint32_t& returned) noexcept;
+
 // One driver wait, on a connection of its own: armed by one request whose first answer carries
 // the wait identifier; the second answer comes when the condition occurs or the wait is cancelled.
 class DeviceWait {
