@@ -78,16 +78,10 @@ void SessionDB::removeSession(ViSession id) {
     for (auto shard = _shards.rbegin(); shard != _shards.rend(); ++shard) shard->lock.unlock();
 }
 
-namespace {
-Globals gGlobals;  // built at load, before any export can run
-}
+Globals gGlobals;
 
-Globals& globals() noexcept { return gGlobals; }
-
-void checkGlobalInit() {
-    const std::int32_t code = globals().initStatus.code;
-    if (code != 0)
-        throw ZRERR_RAISE(tiktalerr_internalSoftware).debug("msg", "global initialization failed").debug("code", code);
+void failGlobalInit(std::int32_t code) {
+    throw ZRERR_RAISE(tiktalerr_internalSoftware).debug("msg", "global initialization failed").debug("code", code);
 }
 
 }  // namespace tiktal

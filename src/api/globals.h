@@ -92,9 +92,13 @@ struct Globals {
     GuardedMutex deviceListLock{initStatus, __LINE__};
 };
 
-Globals& globals() noexcept;
+extern Globals gGlobals;  // built at load, before any export can run
+inline Globals& globals() noexcept { return gGlobals; }
 
+[[noreturn]] void failGlobalInit(std::int32_t code);
 // Fails with tiktalerr_internalSoftware when the process-wide initialization failed.
-void checkGlobalInit();
+inline void checkGlobalInit() {
+    if (const std::int32_t code = gGlobals.initStatus.code; code != 0) failGlobalInit(code);
+}
 
 }  // namespace tiktal
