@@ -1,6 +1,7 @@
 // Building the list of local devices on simulated machines of 10, 100 and 1,000 timing modules in
 // PXI chassis: from no configuration file (enumeration, merge, save), and again with the file
-// already holding the result, which is then not written. The machines are laid out by the
+// already holding the result, which is then not written; and 1,000 and 10,000 new simulated devices
+// that get numbered aliases. The machines are laid out by the
 // project's command in a temporary folder, removed at the end.
 #include <benchmark/benchmark.h>
 #include <stdlib.h>
@@ -14,6 +15,7 @@
 #include <cstring>
 #include <exception>
 #include <filesystem>
+#include <fstream>
 #include <stdexcept>
 #include <string>
 #include <thread>
@@ -90,6 +92,34 @@ void DeviceListUnchanged(benchmark::State& state) {
     });
 }
 
+// New simulated devices at a PCI address in no chassis, which get numbered aliases (Sync1, Sync2,
+// ...) one after the other; no module, and no configuration file before each build.
+void NumberedAliasesFromScratch(benchmark::State& state) {
+    const int devices = static_cast<int>(state.range(0));
+    const std::string root = machines.base() + "/numbered-" + std::to_string(devices);
+    const std::string data = root + "/var/lib/Korvane/tiktal";
+    fs::create_directories(data);
+    for (int n = 0; n < devices; ++n)
+        std::ofstream(data + "/d" + std::to_string(n) + ".fake")
+            << R"({"serialNumber":"5eed","pciDeviceID":29701,"pciSubsystemID":1,"pciRevision":2,"pciBusNumber":255,)"
+               R"("pciDeviceNumber":0,"pciFunctionNumber":0,"pcieLinkWidth":4,"pcieMaxLinkWidth":4,)"
+               R"("pcieTransferRate":2,"pcieMaxTransferRate":2})";
+    ::setenv("TIKTAL_SYSROOT", root.c_str(), 1);
+    zrjsonconfig::ConfigurationData list;
+    try {
+        for (auto _ : state) {
+            state.PauseTiming();
+            fs::remove(data + "/tiktal.config");
+            state.ResumeTiming();
+            list = tiktalsae::loadDeviceList();
+        }
+    } catch (const std::exception& failure) {
+        state.SkipWithError(failure.what());
+    }
+    if (!list.aliasesInUse().contains("Sync" + std::to_string(devices))) state.SkipWithError("not numbered 1 to N");
+    state.SetComplexityN(devices);
+}
+
 void sizes(benchmark::internal::Benchmark* bench) {
     for (const int modules : kSizes) bench->Arg(modules);
     bench->Unit(benchmark::kMillisecond)->UseRealTime()->Complexity();
@@ -97,6 +127,7 @@ void sizes(benchmark::internal::Benchmark* bench) {
 
 BENCHMARK(DeviceListFromScratch)->Apply(sizes);
 BENCHMARK(DeviceListUnchanged)->Apply(sizes);
+BENCHMARK(NumberedAliasesFromScratch)->Arg(1000)->Arg(10000)->Unit(benchmark::kMillisecond)->UseRealTime()->Complexity();
 
 }  // namespace
 

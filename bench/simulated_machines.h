@@ -54,6 +54,12 @@ public:
         return root;
     }
 
+    // The folder that holds the machines (laid out first when needed).
+    std::string base() {
+        if (_base.empty()) layOutAll();
+        return _base.string();
+    }
+
 private:
     // The chassis query library trusts the times of its inventory file only once they are some
     // seconds old (a file just written may change again within the same tick of the clock), and

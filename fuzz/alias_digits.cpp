@@ -4,8 +4,9 @@
 // Counting up keeps everything before the trailing digits and replaces them by their decimal
 // successor (the same width unless every digit was 9, or "1" when there were none). The free
 // alias is in use by no one (ignoring case), is the candidate itself whenever that is free, and
-// otherwise ends in digits after the candidate's text up to its own trailing digits. The set of
-// aliases in use finds exactly the aliases that the pairwise comparison finds.
+// otherwise the first free one counted up from the candidate's suffix "_1" (or from the candidate
+// when its digits follow "_"). The set of aliases in use finds exactly the aliases that the
+// pairwise comparison finds.
 #include <algorithm>
 #include <string>
 #include <vector>
@@ -71,6 +72,12 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
         const std::size_t stem = firstTrailingDigit(text);
         require(alias.compare(0, stem, text, 0, stem) == 0, "the candidate's text before its digits stays");
         require(firstTrailingDigit(alias) < alias.size(), "a taken candidate gives an alias ending in digits");
+        // The first free one, counting up one by one from candidate + "_1" (or from the candidate
+        // when its digits follow "_"), as aliases have always been chosen.
+        const std::size_t digits = firstTrailingDigit(text);
+        std::string first = digits > 0 && text[digits - 1] == '_' ? text : text + "_1";
+        while (isInUse(first)) first = zrjsonconfig::countUp(first);
+        require(alias == first, "the alias is the first free one counted up from the candidate");
     }
     return 0;
 }

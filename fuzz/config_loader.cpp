@@ -4,7 +4,8 @@
 //
 // Reading alone: only the status exception may leave it, with one of the statuses the rules name
 // and details that name the file. A text that is read is empty, or well-formed UTF-8 holding one
-// JSON object whose versions the software can use; every device of the file is in the data with
+// JSON object whose versions the software can use, with no string that the escape \u0000 would
+// cut short; every device of the file is in the data with
 // its members unchanged, none twice; and what would be written back reads back as the same data.
 //
 // Loading with the driver's providers (without a chassis library) and merging: the load fails
@@ -104,6 +105,23 @@ double versionOf(const cJSON* root, const char* name, double otherwise) {
     return item ? item->valuedouble : otherwise;
 }
 
+// Whether a string of the JSON text holds the escape \u0000 (decoded, a NUL that would cut the
+// string short), found by walking the strings and their escapes one by one.
+bool holdsEscapedNul(std::string_view text) {
+    bool inString = false;
+    for (std::size_t at = 0; at < text.size(); ++at) {
+        if (!inString) {
+            inString = text[at] == '"';
+        } else if (text[at] == '"') {
+            inString = false;
+        } else if (text[at] == '\\') {
+            if (text.substr(at + 1, 5) == "u0000") return true;
+            ++at;  // the escaped character
+        }
+    }
+    return false;
+}
+
 void checkRead(std::string_view text, const LoadedConfiguration& loaded) {
     const cJSON* snapshot = loaded.snapshot.get();
     if (text.empty()) {
@@ -113,6 +131,7 @@ void checkRead(std::string_view text, const LoadedConfiguration& loaded) {
     require(tiktalfuzz::isWellFormed(text) && text.find('\0') == std::string_view::npos,
             "a text that is read is UTF-8 without NUL bytes");
     require(cJSON_IsObject(snapshot), "a text that is read is an object");
+    require(!holdsEscapedNul(text), "a text that is read has no string that an escaped NUL cuts short");
     const double version = versionOf(snapshot, "version", -1);
     const double oldest = versionOf(snapshot, "oldest_compatible_version", version);
     require(version >= 1 && version <= 4294967295.0 && version == std::trunc(version) && oldest >= 0 && oldest <= 1 &&

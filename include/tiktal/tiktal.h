@@ -156,6 +156,15 @@ typedef const ViChar* ViRsrc;
 #define tiktalerr_featureNotSupported               ((ViStatus)0xBFFA4003L)
 #define tiktalerr_invalidMode                       ((ViStatus)0xBFFA4002L)
 #define tiktalerr_invalidDescriptor                 ((ViStatus)0xBFFA4001L)
+/* Statuses of the platform layer and of the device configuration, passed on as they are. */
+#define tiktalerr_warn_operationPending             ((ViStatus)52011L)
+#define tiktalerr_osFault                           ((ViStatus)-52008L)
+#define tiktalerr_accessDenied                      ((ViStatus)-52009L)
+#define tiktalerr_objectNameCollision               ((ViStatus)-52013L)
+#define tiktalerr_bufferTooSmall                    ((ViStatus)-52019L)
+#define tiktalerr_configFileTooNew                  ((ViStatus)0xBFFA917DL)
+#define tiktalerr_configFileTooOld                  ((ViStatus)0xBFFA917EL)
+#define tiktalerr_deviceEntryNotFound               ((ViStatus)0xBFFA917FL)
 
 /* ---- Attributes of a timing module (terminalName is ignored) ------------------------- */
 

@@ -31,7 +31,14 @@ std::string countUp(std::string text) {
 std::string firstFreeFrom(const std::string& candidate, const AliasesInUse& devices) {
     if (!devices.contains(candidate)) return candidate;
     const std::size_t firstDigit = trailingDigits(candidate);
-    std::string alias = firstDigit > 0 && candidate[firstDigit - 1] == '_' ? candidate : candidate + "_1";
+    // Counting on from candidate + "_1", or from a candidate that ends in "_", is numbering
+    // after a prefix that ends in "_".
+    if (firstDigit == 0 || candidate[firstDigit - 1] != '_') {
+        const std::string prefix = candidate + "_";
+        return prefix + std::to_string(devices.firstFreeNumber(prefix));
+    }
+    if (firstDigit == candidate.size()) return candidate + std::to_string(devices.firstFreeNumber(candidate));
+    std::string alias = candidate;  // its own digits after "_" count on, as written ("_09" gives "_10")
     while (devices.contains(alias)) alias = countUp(std::move(alias));
     return alias;
 }
@@ -41,10 +48,7 @@ std::string SimpleAliasFactory::createAlias(DeviceIteratorInterface&, const Alia
 }
 
 std::string SimpleAliasFactory::createSimpleAlias(const AliasesInUse& devices) {
-    for (std::uint64_t n = 1;; ++n) {
-        std::string alias = _prefix + std::to_string(n);
-        if (!devices.contains(alias)) return alias;
-    }
+    return _prefix + std::to_string(devices.firstFreeNumber(_prefix));
 }
 
 PxiLocation locatePxiDevice(zrqpxi::QPXILibrary& library, DeviceIteratorInterface& device) {

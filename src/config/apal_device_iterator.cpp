@@ -3,16 +3,22 @@
 #include <iterator>
 
 #include "config/device_iterator.h"
-#include "errors/zrerr.h"
+#include "config/failure.h"
+#include "support/casefold.h"
 
 namespace zrjsonconfig {
 namespace {
 
-constexpr std::int32_t kNotFound = -52006;
-constexpr std::int32_t kInvalidValue = -52005;
+constexpr Status kNotFound{-52006, "zrapalerr"};
+constexpr Status kInvalidValue{-52005, "zrapalerr"};
 
-[[noreturn]] void fail(std::int32_t status, const char* api, const std::string& path) {
-    throw zrerr::raise(status, "zrapalerr", ZRERR_FILE, __LINE__).debug("api", api).debug("path", path);
+// A failure that names the file (or the property) and says what was wrong with it.
+[[noreturn]] void fail(Status status, const std::string& path, const std::string& what, platform::OsError error = {}) {
+    ZRJSONCONFIG_FAILURE(status).usage(kUsageTypeFilePath, path).comment(what).osError(error).raise();
+}
+
+[[noreturn]] void failOs(const platform::OsError& error, const std::string& path, const std::string& what) {
+    fail({platform::statusOfOsError(error.code), "zrapalerr"}, path, what, error);
 }
 
 // Where each bus property lives: a file of the PCI device's folder, its text hexadecimal ("0x1093"),
@@ -37,17 +43,18 @@ constexpr BusFile kBusFiles[] = {
 
 // A whole number in `text`, checked: digits only, within 32 bits.
 std::uint32_t parseNumber(const std::string& text, int base, const std::string& path) {
+    const char* what = base == 16 ? "The file holds no hexadecimal number of 32 bits" : "The file holds no decimal number of 32 bits";
     std::size_t at = base == 16 && text.compare(0, 2, "0x") == 0 ? 2 : 0;
-    if (at >= text.size() || text.size() - at > (base == 16 ? 8u : 10u)) fail(kInvalidValue, "read", path);
+    if (at >= text.size() || text.size() - at > (base == 16 ? 8u : 10u)) fail(kInvalidValue, path, what);
     std::uint64_t value = 0;
     for (; at < text.size(); ++at) {
         const char c = text[at];
         const int digit = c >= '0' && c <= '9' ? c - '0' : base == 16 && c >= 'a' && c <= 'f' ? c - 'a' + 10
                         : base == 16 && c >= 'A' && c <= 'F' ? c - 'A' + 10 : -1;
-        if (digit < 0) fail(kInvalidValue, "read", path);
+        if (digit < 0) fail(kInvalidValue, path, what);
         value = value * static_cast<unsigned>(base) + static_cast<unsigned>(digit);
     }
-    if (value > 0xFFFFFFFFu) fail(kInvalidValue, "read", path);
+    if (value > 0xFFFFFFFFu) fail(kInvalidValue, path, what);
     return static_cast<std::uint32_t>(value);
 }
 
@@ -62,7 +69,8 @@ std::uint32_t linkSpeedCode(const std::string& text) {
 
 // Bus, device and function of a PCI folder name "DDDD:BB:DD.F".
 std::uint32_t addressPart(const std::string& folder, int part, const std::string& path) {
-    if (folder.size() != 12 || folder[4] != ':' || folder[7] != ':' || folder[10] != '.') fail(kInvalidValue, "readlink", path);
+    if (folder.size() != 12 || folder[4] != ':' || folder[7] != ':' || folder[10] != '.')
+        fail(kInvalidValue, path, "The PCI folder's name is not DDDD:BB:DD.F");
     const std::string piece = part == 0 ? folder.substr(5, 2) : part == 1 ? folder.substr(8, 2) : folder.substr(11, 1);
     return parseNumber(piece, 16, path);
 }
@@ -70,8 +78,9 @@ std::uint32_t addressPart(const std::string& folder, int part, const std::string
 }  // namespace
 
 APALDeviceIterator::APALDeviceIterator() {
-    if (const int error = platform::enumerateDeviceInterfaces(_entries))
-        fail(platform::statusOfOsError(error), "opendir", "sys/class/tiktal");
+    std::string path;
+    if (const platform::OsError error = platform::enumerateDeviceInterfaces(_entries, path))
+        failOs(error, path, "Failed to list the timing modules");
     settle();
 }
 
@@ -95,12 +104,12 @@ bool APALDeviceIterator::readCurrent() {
 const std::string& APALDeviceIterator::fileText(std::size_t at) {
     current();
     const FileRead& file = _files[at];
-    if (file.error) fail(platform::statusOfOsError(file.error), "open", file.path);
+    if (file.error) failOs({"open", file.error}, file.path, "Failed to read file");
     return file.text;
 }
 
 const platform::DeviceInterfaceEntry& APALDeviceIterator::current() const {
-    if (_index >= _entries.size()) fail(kNotFound, "enumerate", "no current device");
+    if (_index >= _entries.size()) fail(kNotFound, "sys/class/tiktal", "No current device");
     return _entries[_index];
 }
 
@@ -115,7 +124,7 @@ std::uint32_t APALDeviceIterator::getBusPropertyU32(const std::string& name) {
         const Form form = kBusFiles[at].form;
         return form == Form::LinkSpeed ? linkSpeedCode(text) : parseNumber(text, form == Form::Hex ? 16 : 10, _files[at].path);
     }
-    fail(kNotFound, "property", name);
+    fail(kNotFound, device.pciFolder, "No property " + name);
 }
 
 // The slot path: the root element, then one element of (device << 3 | function) per PCI function
@@ -139,9 +148,12 @@ std::uint32_t APALDeviceIterator::getDevicePropertyU32(const std::string& name) 
     return parseNumber(getDevicePropertyString(name), 16, _files.back().path);
 }
 
+// Text from the machine goes into the configuration file, which is UTF-8.
 std::string APALDeviceIterator::getDevicePropertyString(const std::string& name) {
-    if (name != "serialNumber") fail(kNotFound, "property", name);
-    return fileText(std::size(kBusFiles));
+    if (name != "serialNumber") fail(kNotFound, current().classFolder, "No property " + name);
+    const std::string& text = fileText(std::size(kBusFiles));
+    if (!support::isValidUtf8(text)) fail(kInvalidValue, _files.back().path, "The file is not valid UTF-8");
+    return text;
 }
 
 std::string APALDeviceIterator::getInterfacePath() { return current().interfacePath; }
@@ -177,7 +189,7 @@ CompositeDeviceIterator::CompositeDeviceIterator(std::vector<std::unique_ptr<Dev
 }
 
 DeviceIteratorInterface& CompositeDeviceIterator::current() {
-    if (isEnd()) fail(kNotFound, "enumerate", "no current device");
+    if (isEnd()) fail(kNotFound, "sys/class/tiktal", "No current device");
     return *_iterators[_position];
 }
 

@@ -19,6 +19,15 @@ bool allNumbersFinite(const cJSON* item) {
     return true;
 }
 
+// Whether a string of the JSON text holds the escape \u0000, which cJSON decodes into a NUL that
+// ends the string there: "Dev\u0000One" would read as "Dev". In JSON a backslash appears only in
+// strings, and each escapes the character after it (so "\\u0000" is a backslash and "u0000").
+bool holdsEscapedNul(const std::string& text) {
+    for (std::size_t at = text.find('\\'); at != std::string::npos; at = text.find('\\', at + 2))
+        if (text.compare(at + 1, 5, "u0000") == 0) return true;
+    return false;
+}
+
 }  // namespace
 
 JsonTree parseObjectText(const std::string& text, const std::string& path) {
@@ -41,6 +50,11 @@ JsonTree parseObjectText(const std::string& text, const std::string& path) {
         ZRJSONCONFIG_FAILURE(kInvalidJson)
             .usage(kUsageTypeFilePath, path)
             .comment("A number is beyond the range of a double")
+            .raise();
+    if (holdsEscapedNul(text))
+        ZRJSONCONFIG_FAILURE(kInvalidJson)
+            .usage(kUsageTypeFilePath, path)
+            .comment("A string holds the escape \\u0000 (NUL), which would end it there")
             .raise();
     if (!cJSON_IsObject(root.get()))
         ZRJSONCONFIG_FAILURE(kNotAnObject).usage(kUsageTypeFilePath, path).comment("The file is not a JSON object").raise();

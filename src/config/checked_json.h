@@ -9,7 +9,8 @@
 
 namespace zrjsonconfig {
 
-// The text of the file at `path` as one JSON object: UTF-8, no NUL byte, nothing but white space
+// The text of the file at `path` as one JSON object: UTF-8, no NUL byte (nor a string with the
+// escape \u0000, which would cut the string short), nothing but white space
 // after the object, no number beyond the range of a double (it could not be written back), and
 // no deeper nesting than cJSON's bound (1000): jsonErrorsInvalidJSON (-52005), or
 // jsonErrorsNotAnObject (-52004) for a value that is not an object.

@@ -31,6 +31,7 @@ public:
     void load(DeviceIteratorInterface* devices, AttributeProviderInterface& provider);
 
     const ConfigurationData& data() const noexcept { return _data; }
+    ConfigurationData takeData() noexcept { return std::move(_data); }
 
 private:
     void loadLocked(DeviceIteratorInterface* devices, AttributeProviderInterface& provider);

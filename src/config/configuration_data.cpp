@@ -1,7 +1,5 @@
 #include "config/configuration_data.h"
 
-#include <algorithm>
-
 #include "config/failure.h"
 #include "json/zrjsonlh.h"
 
@@ -22,13 +20,14 @@ DeviceEntry::DeviceEntry(std::string token, JsonTree configured, JsonTree provid
 DeviceEntry::DeviceEntry(const DeviceEntry& other)
     : _token(other._token), _configured(duplicate(other.configured())), _provided(duplicate(other.provided())) {}
 
-ConfigurationData::ConfigurationData(const ConfigurationData& other) {
-    for (const std::shared_ptr<DeviceEntry>& entry : other._order) {
-        auto copy = std::make_shared<DeviceEntry>(*entry);
+ConfigurationData::ConfigurationData(const ConfigurationData& other) : _aliases(other._aliases) {
+    _order.reserve(other._entries.size());
+    other.forEachInOrder([&](const DeviceEntry& entry) {
+        auto copy = std::make_shared<DeviceEntry>(entry);
+        copy->_position = _order.size();
         _entries.emplace(copy->token(), copy);
         _order.push_back(std::move(copy));
-    }
-    _aliases = other._aliases;
+    });
 }
 
 ConfigurationData& ConfigurationData::operator=(const ConfigurationData& other) {
@@ -43,8 +42,10 @@ void ConfigurationData::add(const std::string& token, JsonTree configured, JsonT
         ZRJSONCONFIG_FAILURE(kObjectNameCollision).usage(kUsageTypeToken, token).raise();
     const char* alias = aliasOf(configured.get());
     auto entry = std::make_shared<DeviceEntry>(token, std::move(configured), std::move(provided));
+    entry->_position = _order.size();
+    // Room ahead, growing by half, so that nothing below can fail once the map holds it.
+    if (_order.size() == _order.capacity()) _order.reserve(_order.size() + _order.size() / 2 + 16);
     if (alias) _aliases.add(alias);
-    _order.reserve(_order.size() + 1);  // so that nothing below can fail once the map holds it
     _entries.emplace(token, entry);
     _order.push_back(std::move(entry));
 }
@@ -54,8 +55,20 @@ void ConfigurationData::remove(const std::string& token) {
     if (found == _entries.end())
         ZRJSONCONFIG_FAILURE(kErrorDeviceEntryNotFound).usage(kUsageTypeToken, token).raise();
     if (const char* alias = aliasOf(found->second->configured())) _aliases.remove(alias);
-    _order.erase(std::find(_order.begin(), _order.end(), found->second));
+    _order[found->second->_position].reset();
     _entries.erase(found);
+    if (++_holes >= _entries.size()) pack();
+}
+
+void ConfigurationData::pack() noexcept {
+    std::size_t kept = 0;
+    for (std::shared_ptr<DeviceEntry>& entry : _order)
+        if (entry) {
+            entry->_position = kept;
+            _order[kept++] = std::move(entry);
+        }
+    _order.resize(kept);
+    _holes = 0;
 }
 
 std::shared_ptr<DeviceEntry> ConfigurationData::find(const std::string& token) const {
@@ -68,16 +81,14 @@ JsonTree ConfigurationData::configuredJson() const {
     addMember(root.get(), "version", newNumber(kSupportedVersion));
     addMember(root.get(), "oldest_compatible_version", newNumber(kOldestSupportedVersion));
     JsonTree devices = newObject();
-    for (const std::shared_ptr<DeviceEntry>& entry : _order)
-        addMember(devices.get(), entry->token().c_str(), duplicate(entry->configured()));
+    forEachInOrder([&](const DeviceEntry& entry) { addMember(devices.get(), entry.token().c_str(), objectView(entry.configured())); });
     addMember(root.get(), "devices", std::move(devices));
     return root;
 }
 
 JsonTree ConfigurationData::providedJson() const {
     JsonTree root = newObject();
-    for (const std::shared_ptr<DeviceEntry>& entry : _order)
-        addMember(root.get(), entry->token().c_str(), duplicate(entry->provided()));
+    forEachInOrder([&](const DeviceEntry& entry) { addMember(root.get(), entry.token().c_str(), objectView(entry.provided())); });
     return root;
 }
 

@@ -29,9 +29,11 @@ public:
     cJSON* provided() const noexcept { return _provided.get(); }
 
 private:
+    friend class ConfigurationData;
     std::string _token;
     JsonTree _configured;
     JsonTree _provided;
+    std::size_t _position = 0;  // in the order of the data that holds it
 };
 
 // The devices by token, ordered and compared byte by byte (case-sensitive). Entries are shared:
@@ -62,16 +64,28 @@ public:
 
     // The file form: {"version": 1, "oldest_compatible_version": 1, "devices": {token:
     // configured attributes, ...}} with the devices in the order they were added (for a loaded
-    // file: the file's order, then devices added since).
+    // file: the file's order, then devices added since). The devices' objects in it are the
+    // entries' own, not copies: the tree is a view that holds while the data keeps its entries
+    // unchanged (deleting it leaves them alone); duplicate() it to keep it beyond.
     JsonTree configuredJson() const;
-    // {token: provided attributes, ...} in the same order.
+    // {token: provided attributes, ...} in the same order, a view as well.
     JsonTree providedJson() const;
     // The file form as the file holds it: indented JSON text.
     std::string configuredText() const;
 
 private:
+    template <class Visit>
+    void forEachInOrder(Visit visit) const {
+        for (const std::shared_ptr<DeviceEntry>& entry : _order)
+            if (entry) visit(*entry);
+    }
+    void pack() noexcept;
+
     Entries _entries;
-    std::vector<std::shared_ptr<DeviceEntry>> _order;  // the same entries in the order added
+    // The same entries in the order added. A removed entry leaves a hole (null) at its position
+    // until the holes are as many as the entries; then the order is packed.
+    std::vector<std::shared_ptr<DeviceEntry>> _order;
+    std::size_t _holes = 0;
     AliasesInUse _aliases;
 };
 

@@ -18,6 +18,7 @@ JsonTree duplicate(const cJSON* item) { return JsonTree(item ? checked(cJSON_Dup
 JsonTree newString(const std::string& text) { return JsonTree(checked(cJSON_CreateString(text.c_str()))); }
 JsonTree newNumber(double value) { return JsonTree(checked(cJSON_CreateNumber(value))); }
 JsonTree newBool(bool value) { return JsonTree(checked(cJSON_CreateBool(value))); }
+JsonTree objectView(const cJSON* object) { return JsonTree(checked(cJSON_CreateObjectReference(object->child))); }
 
 void addMember(cJSON* object, const char* name, JsonTree value) {
     if (!cJSON_AddItemToObject(object, name, value.get())) throw std::bad_alloc();
@@ -25,8 +26,9 @@ void addMember(cJSON* object, const char* name, JsonTree value) {
 }
 
 void setMember(cJSON* object, const char* name, JsonTree value) {
-    if (!cJSON_GetObjectItem(object, name)) return addMember(object, name, std::move(value));
-    if (!cJSON_ReplaceItemInObject(object, name, value.get())) throw std::bad_alloc();
+    const bool replacing = cJSON_GetObjectItem(object, name) != nullptr;
+    if (!(replacing ? cJSON_ReplaceItemInObject(object, name, value.get()) : cJSON_AddItemToObjectCS(object, name, value.get())))
+        throw std::bad_alloc();
     value.release();
 }
 

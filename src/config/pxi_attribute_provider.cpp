@@ -1,7 +1,5 @@
 #include "config/pxi_attribute_provider.h"
 
-#include <boost/numeric/conversion/cast.hpp>
-
 #include "config/failure.h"
 #include "json/zrjsonlh.h"
 
@@ -20,8 +18,10 @@ std::int32_t configuredLocation(const cJSON* configured, const char* name) {
     return zrjsonlh::getInt32(item);
 }
 
+// A width beyond 31 bits is no width a link has: unknown (-1), as for a device not discovered.
 std::int32_t linkWidth(DeviceIteratorInterface& device, const char* name) {
-    return boost::numeric_cast<std::int32_t>(device.getBusPropertyU32(name));
+    const std::uint32_t width = device.getBusPropertyU32(name);
+    return width <= 0x7FFFFFFFu ? static_cast<std::int32_t>(width) : -1;
 }
 
 }  // namespace

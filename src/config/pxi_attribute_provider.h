@@ -22,7 +22,7 @@ public:
     // can only be stale, or the 0 that loading the file gave it before discovery); another's as the
     // file holds them when both are numbers, else 0.
     void identifiers(DeviceIteratorInterface* device, cJSON* configured);
-    // The PCI address and link widths; a width above 0x7FFFFFFF fails with the numeric overflow.
+    // The PCI address and link widths; a width above 0x7FFFFFFF reads as unknown (-1).
     void pciLocation(DeviceIteratorInterface* device, cJSON* provided);
 
 private:

@@ -38,6 +38,14 @@ std::string fakeDeviceName(const std::string& fileName) {
     return support::isValidUtf8(name) ? kNamePrefix + name : "";
 }
 
+bool isSimulatedDevice(const std::string& token) {
+    return token.compare(0, sizeof kNamePrefix - 1, kNamePrefix) == 0;
+}
+
+std::string simulatedDeviceFile(const std::string& token) {
+    return platform::dataDirectory() + "/" + token.substr(sizeof kNamePrefix - 1) + kExtension;
+}
+
 SyncFakeDeviceIterator::SyncFakeDeviceIterator() : _folder(platform::dataDirectory()) {
     if (platform::listDirectory(_folder, _entries) == ENOMEM) throw std::bad_alloc();
     advance();

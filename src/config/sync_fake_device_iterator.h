@@ -58,5 +58,9 @@ private:
 // is no simulated device: another extension, no name before it (".fake"), or a name that is not
 // UTF-8 (the configuration file, which holds the name, is UTF-8).
 std::string fakeDeviceName(const std::string& fileName);
+// Whether `token` names a simulated device ("FAKE:TIKTAL:" and a name).
+bool isSimulatedDevice(const std::string& token);
+// The file of the simulated device `token` names.
+std::string simulatedDeviceFile(const std::string& token);
 
 }  // namespace tiktalsae

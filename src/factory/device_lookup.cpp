@@ -1,5 +1,6 @@
 #include "factory/device_lookup.h"
 
+#include "config/sync_fake_device_iterator.h"
 #include "factory/pxi_resource_name.h"
 #include "json/zrjsonlh.h"
 
@@ -26,22 +27,27 @@ bool memberIs(const cJSON* object, const char* name, std::uint32_t expected) {
 }  // namespace
 
 DeviceEntryPtr findByAlias(const zrjsonconfig::ConfigurationData& devices, const std::string& name) {
-    for (const auto& [token, entry] : devices.entries())
-        if (equalsInUpperCase(zrjsonlh::getString(zrjsonlh::getObjectItem(entry->configured(), "alias")), name))
-            return entry;
+    for (const auto& [token, entry] : devices.entries()) {
+        const cJSON* alias = cJSON_GetObjectItem(entry->configured(), "alias");
+        if (cJSON_IsString(alias) && equalsInUpperCase(alias->valuestring, name)) return entry;
+    }
     return nullptr;
 }
 
 DeviceEntryPtr findByPciAddress(const zrjsonconfig::ConfigurationData& devices, const std::string& name) {
     PxiResourceName address;
     if (parsePxiResourceName(name, address) != 0) return nullptr;
+    DeviceEntryPtr first;
     for (const auto& [token, entry] : devices.entries()) {
         const cJSON* provided = entry->provided();
-        if (memberIs(provided, "pci_bus", address.bus) && memberIs(provided, "pci_device", address.device) &&
-            memberIs(provided, "pci_function", address.function))
+        if (!memberIs(provided, "pci_bus", address.bus) || !memberIs(provided, "pci_device", address.device) ||
+            !memberIs(provided, "pci_function", address.function))
+            continue;
+        if (!tiktalsae::isSimulatedDevice(token) && cJSON_IsTrue(cJSON_GetObjectItem(provided, "is_present")))
             return entry;
+        if (!first) first = entry;
     }
-    return nullptr;
+    return first;
 }
 
 }  // namespace tiktal

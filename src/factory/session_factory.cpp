@@ -1,9 +1,9 @@
 #include "factory/session_factory.h"
 
-#include <cstring>
 #include <string>
 
 #include "client/horlo_uri.h"
+#include "config/sync_fake_device_iterator.h"
 #include "errors/zrerr.h"
 #include "factory/device_list_cache.h"
 #include "factory/device_lookup.h"
@@ -15,8 +15,6 @@
 
 namespace tiktal {
 namespace {
-
-constexpr char kSimulatedPrefix[] = "FAKE:TIKTAL:";
 
 bool isTimingModule(const cJSON* configured) {
     const cJSON* id = zrjsonlh::getObjectItem(configured, "device_id");
@@ -47,8 +45,7 @@ std::unique_ptr<Session> openLocalDevice(const char* resourceName) {
         DeviceEntryPtr device = findByAlias(*list.devices, name);
         if (!device) device = findByPciAddress(*list.devices, name);
         if (device && isPresent(*device)) {
-            if (device->token().compare(0, std::strlen(kSimulatedPrefix), kSimulatedPrefix) == 0)
-                return std::make_unique<SessionDebugPrintOnly>();
+            if (tiktalsae::isSimulatedDevice(device->token())) return std::make_unique<SessionDebugPrintOnly>();
             if (isTimingModule(device->configured())) return PxieQ300tSession::open(*device);
             unknownName(resourceName);  // present, but no device this driver opens
         }

@@ -652,13 +652,17 @@ int pciPathOf(const std::string& resolved, const std::string& devices, std::stri
 
 }  // namespace
 
-int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexcept {
+OsError enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries, std::string& failedPath) noexcept {
     try {
         entries.clear();
         const std::string base = sysroot();
         const std::string classFolder = base + "/sys/class/tiktal";
         std::vector<std::string> names, roots;
-        if (int error = listFolder(classFolder, names)) return error == ENOENT ? 0 : error;  // no driver: no devices
+        if (int error = listFolder(classFolder, names)) {
+            if (error == ENOENT) return {};  // no driver: no devices
+            failedPath = classFolder;
+            return {"opendir", error};
+        }
         char resolved[PATH_MAX];
         const std::string devices = ::realpath((base + "/sys/devices").c_str(), resolved) ? resolved : "";
         listFolder(devices, roots);
@@ -669,19 +673,22 @@ int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexce
             entry.name = name;
             entry.classFolder = classFolder + "/" + name;
             entry.interfacePath = base + "/dev/" + name;
-            if (!::realpath((entry.classFolder + "/device").c_str(), resolved)) {
-                if (errno == ENOENT) continue;  // removed while the folder was listed: not present
-                return errno;
+            failedPath = entry.classFolder + "/device";
+            if (!::realpath(failedPath.c_str(), resolved)) {
+                // Removed while the folder was listed (not present), or no folder (no device).
+                if (errno == ENOENT || errno == ENOTDIR) continue;
+                return {"realpath", errno};
             }
             entry.pciFolder = resolved;
             std::string root;
-            if (int error = pciPathOf(entry.pciFolder, devices, root, entry.pciPath)) return error;
+            if (int error = pciPathOf(entry.pciFolder, devices, root, entry.pciPath)) return {"realpath", error};
             entry.rootIndex = static_cast<int>(std::find(roots.begin(), roots.end(), root) - roots.begin());
             entries.push_back(std::move(entry));
         }
-        return 0;
+        failedPath.clear();
+        return {};
     } catch (const std::bad_alloc&) {
-        return ENOMEM;
+        return {"malloc", ENOMEM};
     }
 }
 

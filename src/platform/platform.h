@@ -57,6 +57,8 @@ std::string libraryFileName(const std::string& stem);
 // else the directory chosen when the library was configured.
 std::string sharedDirectory();
 
+struct OsError;
+
 // One device interface of the timing module's driver class: an entry of
 // $TIKTAL_SYSROOT/sys/class/tiktal, whose "device" link leads to the PCI device's folder.
 struct DeviceInterfaceEntry {
@@ -70,8 +72,10 @@ struct DeviceInterfaceEntry {
     int rootIndex = 0;
 };
 
-// The device interfaces present now, sorted by name; 0, or the error number of the failure.
-int enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries) noexcept;
+// The device interfaces present now, sorted by name. An entry that is not a folder (a stray file)
+// is no device interface and is passed over, as is one that goes away while the folder is read.
+// On failure, the call that failed, with `failedPath` the path it was given.
+OsError enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries, std::string& failedPath) noexcept;
 // The text of a small attribute file (at most 4 KiB, else EOVERFLOW), without its trailing line
 // feed; 0 or the error number (ENOENT when no regular file is there, as readRegularFile says).
 int readAttributeFile(const std::string& path, std::string& text) noexcept;

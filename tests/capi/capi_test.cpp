@@ -264,7 +264,7 @@ std::vector<StatusRow> readStatusTable() {
 
 TEST(ErrorMessage, EveryRowOfTheStatusTableForAnySession) {
     const std::vector<StatusRow> rows = readStatusTable();
-    ASSERT_EQ(rows.size(), 89u);
+    ASSERT_EQ(rows.size(), 97u);
     const ViSession open = openTraceSession();
     const ViSession sessions[] = {VI_NULL, open, 0x1234};
     for (std::size_t i = 0; i < rows.size(); ++i) {

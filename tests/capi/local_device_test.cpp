@@ -4,7 +4,9 @@
 
 #include <cmath>
 #include <cstdlib>
+#include <filesystem>
 #include <fstream>
+#include <functional>
 #include <limits>
 #include <memory>
 #include <string>
@@ -204,6 +206,82 @@ TEST_F(LocalDevices, AnAbsentModuleCostsOneRebuildAndASimulatedDeviceTraces) {
     std::string lines;
     for (const std::string& write : trace.finish()) lines += write;
     EXPECT_NE(lines.find("tiktal::SessionDebugPrintOnly::setAttributeViReal64"), std::string::npos) << lines;
+}
+
+TEST_F(LocalDevices, OneDevicesMistakesAffectOnlyThatDevice) {
+    // Hand-edited entries without a text alias, whose tokens sort before the modules' ones.
+    std::ofstream(dataDirectory() + "/tiktal.config")
+        << R"({"version":1,"devices":{"A1":{},"A2":{"alias":5},"A3":{"alias":null}}})";
+    // Slot 4 reports a link wider than 31 bits; a simulated device sits at slot 2's PCI address.
+    std::ofstream(_root + "/sys/devices/pci0000:01/0000:01:00.0/0000:02:04.0/current_link_width") << "2147483648\n";
+    machine("fake " + _root + R"( shadow --json '{"pciBusNumber":2,"pciDeviceNumber":2,"pcieMaxLinkWidth":4294967295}')");
+    testsupport::StderrCapture trace;
+    EXPECT_EQ(int32(open("PXI1Slot2"), 1150002), 0x7405);
+    EXPECT_EQ(int32(open("PXI0::2-2.0::INSTR"), 1150002), 0x7405) << "the module, not the simulated device";
+    EXPECT_EQ(int32(open("PXI1Slot4"), 1150002), 0x7406);
+    EXPECT_NE(open("PXI1Slot2_1"), 0u) << "the simulated device opens by its alias";
+    std::string lines;
+    for (const std::string& write : trace.finish()) lines += write;
+    EXPECT_NE(lines.find("Simulated device " + dataDirectory() + "/shadow.fake is left out of the lookup by PCI address"),
+              std::string::npos) << lines;
+
+    std::ifstream in(dataDirectory() + "/tiktal.config");
+    const std::string file((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+    EXPECT_NE(file.find("\"alias\":\t5,"), std::string::npos) << file;
+    EXPECT_NE(file.find("\"alias\":\tnull,"), std::string::npos) << file;
+    EXPECT_NE(file.find("\"A1\":\t{\n\t\t\t\"serial_number\""), std::string::npos) << "still without an alias";
+}
+
+// Each build of the device list that fails says so once on standard error, with the file and what
+// is wrong with it; text that is not UTF-8, and strings that an escaped NUL would cut short, never
+// make it into the list or the configuration file.
+TEST_F(LocalDevices, AListThatCannotBeBuiltSaysWhichFileAndWhatOnce) {
+    const std::string config = dataDirectory() + "/tiktal.config";
+    const std::string serial = _root + "/sys/class/tiktal/tiktal0/serial_number";
+    const std::string link = _root + "/sys/class/tiktal/tiktal1/device";
+    const std::string target = std::filesystem::read_symlink(link);
+    const auto write = [](const std::string& path, const std::string& text) { std::ofstream(path) << text; };
+    const auto relink = [&](const std::string& to) {
+        std::filesystem::remove(link);
+        std::filesystem::create_symlink(to, link);
+    };
+    struct Case {
+        std::function<void()> make, mend;
+        ViStatus status;
+        std::string file, what;
+    };
+    const std::vector<Case> cases{
+        {[&] { write(serial, "\xff\xfe\n"); }, [&] { write(serial, "1a2b\n"); }, tiktalerr_invParameter, serial,
+         "not valid UTF-8"},
+        {[&] { write(serial, std::string(5000, '1')); }, [&] { write(serial, "1a2b\n"); }, tiktalerr_bufferTooSmall,
+         serial, "Failed to read file"},
+        {[&] { write(config, R"({"version":1,"devices":{"A":{"alias":"Dev\u0000One"}}})"); }, [&] { write(config, ""); },
+         tiktalerr_invParameter, config, R"(\\u0000)"},
+        {[&] { machine("fake " + _root + R"( board --json '{"serialNumber":"12\u000034"}')"); },
+         [&] { machine("remove-fake " + _root + " board"); }, tiktalerr_invParameter, dataDirectory() + "/board.fake",
+         R"(\\u0000)"},
+        {[&] { relink("device"); }, [&] { relink(target); }, tiktalerr_internalSoftware, link,
+         "Failed to list the timing modules"}};
+    for (const Case& hostile : cases) {
+        hostile.make();
+        testsupport::StderrCapture trace;
+        EXPECT_EQ(open("PXI1Slot2"), 0u) << hostile.file;
+        EXPECT_EQ(status, hostile.status) << hostile.file;
+        std::string lines;
+        for (const std::string& line : trace.finish()) lines += line;
+        EXPECT_EQ(lines.rfind("Fatal configuration error! {", 0), 0u) << lines;
+        EXPECT_EQ(lines.find("Fatal", 1), std::string::npos) << "once: " << lines;
+        EXPECT_NE(lines.find(hostile.file), std::string::npos) << lines;
+        EXPECT_NE(lines.find(hostile.what), std::string::npos) << lines;
+        hostile.mend();
+    }
+    char message[TIKTAL_ERROR_MESSAGE_SIZE];
+    EXPECT_EQ(tiktal_error_message(VI_NULL, tiktalerr_bufferTooSmall, message), VI_SUCCESS) << message;
+
+    // A stray file in the class folder is no module.
+    write(_root + "/sys/class/tiktal/README", "not a module");
+    EXPECT_NE(open("PXI1Slot2"), 0u);
+    EXPECT_EQ(int32(open("pxi1slot2"), 1150001), 6699);
 }
 
 TEST_F(LocalDevices, AModuleWhoseDriverIsNotRunningFailsAtOnce) {

@@ -5,6 +5,9 @@
 
 #include <map>
 #include <memory>
+#include <random>
+#include <set>
+#include <string>
 
 #include "config/alias_factory.h"
 #include "config/qpxi_library.h"
@@ -164,6 +167,36 @@ TEST(SimpleAliases, TheFirstFreeNumberAfterThePrefixIgnoringCase) {
 
     zrjsonconfig::SimpleAliasFactory accented("Horloge\xC3\xA9");  // "Horlogeé"
     EXPECT_EQ(accented.createSimpleAlias({"HORLOGE\xC3\x89" "1"}), "Horloge\xC3\xA9" "2") << "É folds to é";
+}
+
+// The set remembers where its numbering got to; whatever was added and removed since, the alias
+// is still the first free one.
+TEST(SimpleAliases, AfterAddsAndRemovesStillTheFirstFreeNumber) {
+    zrjsonconfig::SimpleAliasFactory sync("Sync");
+    AliasesInUse devices{"PXI1Slot2"};
+    std::multiset<std::string> used;  // lower case
+    std::mt19937 random(18);
+    const auto firstFree = [&](const std::string& prefix) {
+        int n = 1;
+        while (used.count(prefix + std::to_string(n))) ++n;
+        return n;
+    };
+    for (int step = 0; step < 3000; ++step) {
+        const bool numbered = random() % 2;
+        const std::string number = std::to_string(1 + random() % 30);
+        const std::string lower = (numbered ? "sync" : "pxi1slot2_") + number;
+        const std::string alias = (random() % 2 ? (numbered ? "SYNC" : "PXI1Slot2_") : (numbered ? "Sync" : "pxi1slot2_")) + number;
+        if (random() % 3 == 0 && used.count(lower)) {
+            devices.remove(alias);
+            used.erase(used.find(lower));
+        } else {
+            devices.add(alias);
+            used.insert(lower);
+        }
+        ASSERT_EQ(sync.createSimpleAlias(devices), "Sync" + std::to_string(firstFree("sync"))) << step;
+        ASSERT_EQ(zrjsonconfig::firstFreeFrom("PXI1Slot2", devices), "PXI1Slot2_" + std::to_string(firstFree("pxi1slot2_")))
+            << step;
+    }
 }
 
 TEST(AliasText, CountsTrailingDigitsUpAsText) {

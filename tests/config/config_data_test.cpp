@@ -192,6 +192,7 @@ TEST_F(ConfigurationFile, TextThatIsNotOneJsonObjectInUtf8FailsAndNamesTheFile) 
         const char* constant;
         const char* comment;
     };
+    const char* const kEscapedNul = "A string holds the escape \\u0000 (NUL), which would end it there";
     const std::vector<Case> cases = {
         {" \n\t", -52005, "jsonErrorsInvalidJSON", "The file is not JSON"},
         {"tiktal", -52005, "jsonErrorsInvalidJSON", "The file is not JSON"},
@@ -204,6 +205,8 @@ TEST_F(ConfigurationFile, TextThatIsNotOneJsonObjectInUtf8FailsAndNamesTheFile) 
         {"{\"version\":1,\"devices\":{\"\xed\xa0\x80\":{}}}", -52005, "jsonErrorsInvalidJSON", "The file is not valid UTF-8"},
         {R"({"version":1,"devices":{"t":{"pxi_slot_number":1e400}}})", -52005, "jsonErrorsInvalidJSON",
          "A number is beyond the range of a double"},
+        {R"({"version":1,"devices":{"X\u0000Y":{}}})", -52005, "jsonErrorsInvalidJSON", kEscapedNul},
+        {R"({"version":1,"devices":{"t":{"alias":"Dev\\\u0000One"}}})", -52005, "jsonErrorsInvalidJSON", kEscapedNul},
         {"[1]", -52004, "jsonErrorsNotAnObject", "The file is not a JSON object"},
         {"\"version\"", -52004, "jsonErrorsNotAnObject", "The file is not a JSON object"},
     };
@@ -215,8 +218,10 @@ TEST_F(ConfigurationFile, TextThatIsNotOneJsonObjectInUtf8FailsAndNamesTheFile) 
         EXPECT_EQ(details.records, (std::vector<std::string>{"kUsageTypeFilePath=" + path(), std::string("# ") + c.comment}));
         EXPECT_EQ(configtest::readText(path()), c.text);  // a failed load leaves the file alone
     }
-    // White space around the object is fine.
+    // White space around the object is fine, and so is a backslash followed by "u0000".
     EXPECT_NE(loadText(" \r\n{\"version\":1}\n\t ").snapshot, nullptr);
+    EXPECT_EQ(tokensInFileOrder(loadText(R"({"version":1,"devices":{"C:\\u0000":{}}})").data),
+              std::vector<std::string>{"C:\\u0000"});
 }
 
 TEST_F(ConfigurationFile, VersionRules) {
