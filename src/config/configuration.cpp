@@ -1,8 +1,10 @@
 #include "config/configuration.h"
 
+#include <algorithm>
 #include <cstring>
 #include <exception>
 #include <string>
+#include <vector>
 
 #include "config/loader.h"
 #include "json/zrjsonlh.h"
@@ -24,10 +26,33 @@ bool equalInOrder(const cJSON* a, const cJSON* b) {
     return a == b;  // both ended
 }
 
-// Equal JSON, object members in any order, names compared with case.
-bool sameJson(const cJSON* a, const cJSON* b) {
-    return equalInOrder(a, b) || cJSON_Compare(a, b, true);
+// Equal JSON, object members in any order, names compared with case. Each object's members are
+// looked up among the other's sorted by name, so a file of many devices in another order costs
+// n log n, not n squared.
+bool sameMembers(const cJSON* a, const cJSON* b) {
+    if ((a->type & 0xFF) != (b->type & 0xFF)) return false;
+    if (cJSON_IsNumber(a)) return a->valuedouble == b->valuedouble;
+    if (cJSON_IsString(a)) return std::strcmp(a->valuestring, b->valuestring) == 0;
+    if (cJSON_IsArray(a)) {
+        for (a = a->child, b = b->child; a && b; a = a->next, b = b->next)
+            if (!sameMembers(a, b)) return false;
+        return a == b;  // both ended
+    }
+    if (!cJSON_IsObject(a)) return true;  // null, true, false
+    std::vector<const cJSON*> members;
+    for (const cJSON* member = b->child; member; member = member->next) members.push_back(member);
+    const auto byName = [](const cJSON* x, const cJSON* y) { return std::strcmp(x->string, y->string) < 0; };
+    std::stable_sort(members.begin(), members.end(), byName);
+    std::size_t count = 0;
+    for (const cJSON* member = a->child; member; member = member->next, ++count) {
+        const auto found = std::lower_bound(members.begin(), members.end(), member, byName);
+        if (found == members.end() || std::strcmp((*found)->string, member->string) != 0 || !sameMembers(member, *found))
+            return false;
+    }
+    return count == members.size();
 }
+
+bool sameJson(const cJSON* a, const cJSON* b) { return equalInOrder(a, b) || sameMembers(a, b); }
 
 void traceFailure(const char* what) {
     const std::string line = std::string("Fatal configuration error! ") + what + "\n";
