@@ -65,7 +65,9 @@ public:
 private:
     static constexpr std::size_t kShards = 16;
 
-    struct Entry {
+    // Each call writes its session's count: the counts of two sessions never share memory that
+    // the processor fetches at once.
+    struct alignas(kCacheLinePair) Entry {
         std::shared_ptr<Session> session;
         std::uint32_t calls = 0;  // calls holding it now
         bool closed = false;      // closed while held: gone for lookups, ended by the last call
