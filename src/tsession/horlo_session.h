@@ -3,12 +3,12 @@
 // time.
 #pragma once
 
+#include <cjson/cJSON.h>
+
 #include <memory>
 #include <mutex>
 #include <string>
 #include <vector>
-
-#include <cjson/cJSON.h>
 
 #include "sessions/session.h"
 #include "tsession/attr_dict.h"
