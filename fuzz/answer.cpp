@@ -5,7 +5,8 @@
 //   answer whose "error" member does not say "success": true never reads as success or as a
 //   warning. What it returns is one whole JSON value: the "result" member as written, or the body.
 // - When the whole text passes the check, the value of every member found is a piece of the
-//   text that passes the check too, and the readers agree with that piece.
+//   text that passes the check too, and the readers agree with that piece; the check itself
+//   notes the envelope's members where the lookup finds them.
 // - Wrapping a checked text in one more array or object never breaks it, except by depth.
 // - A body that starts with a number is also taken as an HTTP status code: classify lets every
 //   2xx code pass but 202, which is its only warning; every other failure is an error.
@@ -112,6 +113,17 @@ void checkMember(std::string_view text, std::string_view name) {
     if (!string.empty()) require(*value == "\"" + std::string(string) + "\"", "readString gives what stands between the quotes");
 }
 
+// The walk of the whole check notes the envelope's members where the lookup finds them.
+void checkEnvelope(std::string_view text) {
+    envelope::Envelope members;
+    require(envelope::check(text, members) == envelope::kOk, "the check that notes members passes the same texts");
+    for (const auto& [name, noted] : {std::pair{"error", members.error}, std::pair{"result", members.result}}) {
+        const auto at = envelope::findMember(text, name);
+        require(at.has_value() == noted.has_value(), "the check notes a member exactly when the lookup finds it");
+        if (at) require(noted->data() == text.data() + *at && noted == envelope::valueText(text, *at), "the noted value is the member's");
+    }
+}
+
 // Names to look up: those of the envelope, and the first quoted text of the input.
 void checkMembers(std::string_view text) {
     for (const char* name : {"error", "result", "success", "errorCode", "errorText", "errorInfo"}) checkMember(text, name);
@@ -137,6 +149,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     checkUnwrap(body);
     if (envelope::check(body) == envelope::kOk) {
         checkNesting(body);
+        checkEnvelope(body);
         checkMembers(body);
     } else {
         // Members of a text that fails the check: found or not, nothing may crash.

@@ -6,6 +6,7 @@
 // std::bad_alloc. Any other exception ends the run. Beyond that:
 // - a null member that the caller needs (OnNull::fail) fails;
 // - counting an array's elements with the iterator gives its size;
+// - a member read from the parsed object is the one read from the text;
 // - on trees the comparison is checked on (see comparable): an object member's text, parsed
 //   again, equals the member and prints the same; equals is reflexive and symmetric.
 #include <boost/lexical_cast.hpp>
@@ -92,6 +93,12 @@ void checkHelpers(const std::string& text, const char* name) {
         zrjson::getStringArrayMember(text, name, out);
     });
     expectStatusOnFailure([&] { zrjson::getInt32Member(text, name); });
+    expectStatusOnFailure([&] {
+        std::string fromText = "untouched", fromTree = "untouched";
+        const bool found = zrjson::getStringMember(text, name, fromText);
+        require(zrjson::getStringMember(tree.get(), name, fromTree) == found && fromTree == fromText,
+                "the parsed object reads as its text");
+    });
     expectStatusOnFailure([&] {
         std::string out;
         if (!zrjson::getObjectMemberText(text, name, out)) return;

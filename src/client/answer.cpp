@@ -37,14 +37,15 @@ void classify(long responseCode) {
 }
 
 std::string unwrap(const std::string& body) {
-    const envelope::ScanError scan = envelope::check(body);
+    envelope::Envelope members;
+    const envelope::ScanError scan = envelope::check(body, members);
     if (scan != envelope::kOk) throw TCURL_RAISE(kInvalidJSONResponseFromServer).debug("jsonz_ErrorCode", static_cast<int>(scan));
 
     bool success = true;
     std::optional<double> errorCode;
     std::string_view errorCodeText, errorText, errorInfo;
-    if (const auto error = envelope::findMember(body, "error")) {
-        const std::string_view errorValue = envelope::valueText(body, *error).value_or("");
+    if (members.error) {
+        const std::string_view errorValue = *members.error;
         const auto member = [&](const char* name) { return envelope::findMember(errorValue, name); };
         const auto successAt = member("success");
         success = successAt && envelope::readBool(errorValue, *successAt);
@@ -65,8 +66,7 @@ std::string unwrap(const std::string& body) {
             .debug("errorText", std::string(errorText))
             .debug("errorInfo", std::string(errorInfo));
     }
-    if (const auto result = envelope::findMember(body, "result"))
-        if (const auto text = envelope::valueText(body, *result)) return std::string(*text);
+    if (members.result) return std::string(*members.result);
     return body;
 }
 

@@ -37,22 +37,7 @@ void checkOption(CURLcode code, const char* call) {
 // Sets one option and records the call's text when it fails.
 #define TCURL_SETOPT(option, value, text) checkOption(lib::easySetopt(handle, option, value), text)
 
-
-// The header list and the error buffer live only as long as one request: the handle must not
-// keep pointing at them afterwards, whichever way the request ends.
-class RequestScope {
-public:
-    explicit RequestScope(CURL* handle) : _handle(handle) {}
-    ~RequestScope() {
-        lib::easySetopt(_handle, CURLOPT_HTTPHEADER, static_cast<curl_slist*>(nullptr));
-        lib::easySetopt(_handle, CURLOPT_ERRORBUFFER, static_cast<char*>(nullptr));
-    }
-    RequestScope(const RequestScope&) = delete;
-    RequestScope& operator=(const RequestScope&) = delete;
-
-private:
-    CURL* _handle;
-};
+static_assert(CURL_ERROR_SIZE == 256, "the error buffer of tCURL holds CURL_ERROR_SIZE bytes");
 
 }  // namespace
 
@@ -65,17 +50,20 @@ void tCURL::initialize(const std::string& uri, const std::string& prefix, std::u
     _uri = uri;
     _prefix = prefix;
     _timeoutInMS = timeoutInMS;
+    _handleOptionsSet = false;
     if (!_connection) throw TCURL_RAISE(kInternalSoftwareErrorFailedInitialize).debug("check failed", "_connection");
 }
 
 void tCURL::setMediaType(const std::string& mediaType) {
     _acceptType = mediaType;
     _contentType = _acceptType;
+    _handleOptionsSet = false;
 }
 
 void tCURL::setCredentials(const std::string& username, const std::string& password) {
     _username = username;
     _password = password;
+    _handleOptionsSet = false;
 }
 
 std::string tCURL::get(const std::string& path) { return request(false, path, putTextBuffer); }
@@ -85,40 +73,52 @@ std::string tCURL::put(const std::string& path, const std::string& body) {
     return request(true, path, upload);
 }
 
-void tCURL::setOptions(bool upload, const std::string& url, HeaderList& headers, char* errorBuffer,
-                       std::string& uploadBuffer) {
+// The options that stay the same from one request to the next.
+void tCURL::setHandleOptions() {
     CURL* handle = static_cast<CURL*>(_connection);
     TCURL_SETOPT(CURLOPT_READFUNCTION, readCallback, "curl_easy_setopt(_connection, CURLOPT_READFUNCTION, _readCallback)");
     TCURL_SETOPT(CURLOPT_WRITEFUNCTION, writeCallback,
                  "curl_easy_setopt(_connection, CURLOPT_WRITEFUNCTION, _writeCallback)");
     TCURL_SETOPT(CURLOPT_WRITEDATA, &tempBufferForGet, "curl_easy_setopt(_connection, CURLOPT_WRITEDATA, &tempBufferForGet)");
-    TCURL_SETOPT(CURLOPT_READDATA, &uploadBuffer, "curl_easy_setopt(_connection, CURLOPT_READDATA, &putTextBuffer)");
-    TCURL_SETOPT(CURLOPT_UPLOAD, upload ? 1L : 0L, "curl_easy_setopt(_connection, CURLOPT_UPLOAD, upload ? 1L : 0L)");
     TCURL_SETOPT(CURLOPT_TIMEOUT_MS, static_cast<long>(_timeoutInMS),
                  "curl_easy_setopt(_connection, CURLOPT_TIMEOUT_MS, static_cast<long>(_timeoutInMS))");
     TCURL_SETOPT(CURLOPT_NOSIGNAL, 1L, "curl_easy_setopt(_connection, CURLOPT_NOSIGNAL, 1L)");
-    TCURL_SETOPT(CURLOPT_URL, url.c_str(), "curl_easy_setopt(_connection, CURLOPT_URL, url.c_str())");
     // An answer that announces more than the transport takes is refused before its body is read.
     TCURL_SETOPT(CURLOPT_MAXFILESIZE_LARGE, static_cast<curl_off_t>(kMaxAnswerBytes),
                  "curl_easy_setopt(_connection, CURLOPT_MAXFILESIZE_LARGE, kMaxAnswerBytes)");
-    if (!_username.empty())
-        TCURL_SETOPT(CURLOPT_USERNAME, _username.c_str(), "curl_easy_setopt(_connection, CURLOPT_USERNAME, _username.c_str())");
-    if (!_password.empty())
-        TCURL_SETOPT(CURLOPT_PASSWORD, _password.c_str(), "curl_easy_setopt(_connection, CURLOPT_PASSWORD, _password.c_str())");
-    const auto addHeader = [&headers](const std::string& line) {
-        curl_slist* list = lib::slistAppend(headers.get(), line.c_str());
+    const char* username = _username.empty() ? nullptr : _username.c_str();  // null: none
+    const char* password = _password.empty() ? nullptr : _password.c_str();
+    TCURL_SETOPT(CURLOPT_USERNAME, username, "curl_easy_setopt(_connection, CURLOPT_USERNAME, _username.c_str())");
+    TCURL_SETOPT(CURLOPT_PASSWORD, password, "curl_easy_setopt(_connection, CURLOPT_PASSWORD, _password.c_str())");
+
+    // The handle lets go of the old list before it is freed.
+    TCURL_SETOPT(CURLOPT_HTTPHEADER, static_cast<curl_slist*>(nullptr),
+                 "curl_easy_setopt(_connection, CURLOPT_HTTPHEADER, nullptr)");
+    _headers.reset();
+    const auto addHeader = [this](const std::string& line) {
+        curl_slist* list = lib::slistAppend(_headers.get(), line.c_str());
         if (!list) throw std::bad_alloc();
-        (void)headers.release();  // the same list, or a new one when it was empty
-        headers.reset(list);
+        (void)_headers.release();  // the same list, or a new one when it was empty
+        _headers.reset(list);
     };
     if (!_acceptType.empty()) addHeader("Accept: " + _acceptType);
     if (!_contentType.empty()) addHeader("Content-Type: " + _contentType);
     // An upload goes out at once: many services never answer "Expect: 100-continue", and libcurl
-    // would wait a second for it. A header without a value removes libcurl's own.
-    if (upload) addHeader("Expect:");
-    if (headers)
-        TCURL_SETOPT(CURLOPT_HTTPHEADER, headers.get(), "curl_easy_setopt(_connection, CURLOPT_HTTPHEADER, headerList.get())");
-    TCURL_SETOPT(CURLOPT_ERRORBUFFER, errorBuffer, "curl_easy_setopt(_connection, CURLOPT_ERRORBUFFER, errbuf)");
+    // would wait a second for it. A header without a value only removes libcurl's own, so a GET,
+    // which has none, sends nothing for it.
+    addHeader("Expect:");
+    TCURL_SETOPT(CURLOPT_HTTPHEADER, _headers.get(), "curl_easy_setopt(_connection, CURLOPT_HTTPHEADER, headerList.get())");
+    TCURL_SETOPT(CURLOPT_ERRORBUFFER, _errorBuffer, "curl_easy_setopt(_connection, CURLOPT_ERRORBUFFER, errbuf)");
+    _handleOptionsSet = true;
+}
+
+void tCURL::setRequestOptions(bool upload, const std::string& path, std::string& uploadBuffer) {
+    CURL* handle = static_cast<CURL*>(_connection);
+    if (!_handleOptionsSet) setHandleOptions();
+    TCURL_SETOPT(CURLOPT_READDATA, &uploadBuffer, "curl_easy_setopt(_connection, CURLOPT_READDATA, &putTextBuffer)");
+    TCURL_SETOPT(CURLOPT_UPLOAD, upload ? 1L : 0L, "curl_easy_setopt(_connection, CURLOPT_UPLOAD, upload ? 1L : 0L)");
+    _url.assign(_uri).append("/").append(_prefix).append("/").append(path);
+    TCURL_SETOPT(CURLOPT_URL, _url.c_str(), "curl_easy_setopt(_connection, CURLOPT_URL, url.c_str())");
 }
 
 std::string tCURL::request(bool upload, const std::string& path, std::string& uploadBuffer) {
@@ -127,17 +127,15 @@ std::string tCURL::request(bool upload, const std::string& path, std::string& up
     if (_prefix.empty()) throw TCURL_RAISE(kInvalidURIPrefix).debug("check failed", "!_prefix.empty()");
 
     CURL* handle = static_cast<CURL*>(_connection);
-    HeaderList headers;
-    char errorBuffer[CURL_ERROR_SIZE] = {};
-    const RequestScope scope(handle);
-    setOptions(upload, _uri + "/" + _prefix + "/" + path, headers, errorBuffer, uploadBuffer);
+    setRequestOptions(upload, path, uploadBuffer);
+    _errorBuffer[0] = '\0';
 
     const CURLcode performed = lib::easyPerform(handle);
     if (performed != CURLE_OK) {
         zrerr::Exception failure = TCURL_RAISE(kInternalSoftwareErrorUnknownNetworkError)
                                        .debug("function", "curl_easy_perform")
                                        .debug("CURLcode", static_cast<int>(performed))
-                                       .debug("CURLOPT_ERRORBUFFER", errorBuffer);
+                                       .debug("CURLOPT_ERRORBUFFER", _errorBuffer);
         if (performed == CURLE_WRITE_ERROR || performed == CURLE_FILESIZE_EXCEEDED)
             failure.debug("maxAnswerBytes", kMaxAnswerBytes);
         throw failure;

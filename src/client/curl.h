@@ -60,8 +60,8 @@ private:
     using HeaderList = std::unique_ptr<curl_slist, HeaderListDeleter>;
 
     std::string request(bool upload, const std::string& path, std::string& uploadBuffer);
-    void setOptions(bool upload, const std::string& url, HeaderList& headers, char* errorBuffer,
-                    std::string& uploadBuffer);
+    void setHandleOptions();
+    void setRequestOptions(bool upload, const std::string& path, std::string& uploadBuffer);
 
     void* _connection = nullptr;
     std::string tempBufferForGet;
@@ -73,6 +73,13 @@ private:
     std::string _contentType = "vnd.zr.vantle.v0/json; charset=utf-8";
     std::string _username;
     std::string _password;
+    // What the handle keeps between requests: the options that change only with the settings
+    // above (set again on the first request after a change), the header list and the error
+    // buffer it points at, both as long-lived as the handle, and the last request's URL.
+    bool _handleOptionsSet = false;
+    HeaderList _headers;
+    char _errorBuffer[256] = {};
+    std::string _url;
 };
 
 }  // namespace zr::vantle::shared

@@ -14,7 +14,8 @@ bool isHex(char c) { return isDigit(c) || (c >= 'a' && c <= 'f') || (c >= 'A' &&
 // A recursive-descent walk over one value; remembers where the value ended.
 class Scanner {
 public:
-    explicit Scanner(std::string_view text, std::size_t at = 0) : _text(text), _at(at) {}
+    explicit Scanner(std::string_view text, std::size_t at = 0, Envelope* envelope = nullptr)
+        : _text(text), _at(at), _envelope(envelope) {}
 
     void skipSpace() {
         while (_at < _text.size() && isSpace(_text[_at])) ++_at;
@@ -66,13 +67,19 @@ public:
             ++_at;
             return kOk;
         }
+        const bool envelope = _envelope && _depth == 1;  // the members of the top-level object
+        std::string name;
         for (;;) {
             skipSpace();
-            if (ScanError e = string(nullptr); e != kOk) return e;
+            name.clear();
+            if (ScanError e = string(envelope ? &name : nullptr); e != kOk) return e;
             skipSpace();
             if (peek() != ':') return atEnd() ? kObjectNotClosed : kMissingColon;
             ++_at;
+            skipSpace();
+            const std::size_t start = _at;
             if (ScanError e = value(); e != kOk) return e;
+            if (envelope) note(name, _text.substr(start, _at - start));
             if (ScanError e = separator('}', kObjectNotClosed); e != kOk) return e == kClosed ? kOk : e;
         }
     }
@@ -101,6 +108,12 @@ private:
         ~Nesting() { --_depth; }
         int& _depth;
     };
+
+    // Keeps the value of the first member of each name the envelope has.
+    void note(const std::string& name, std::string_view value) {
+        if (name == "error" && !_envelope->error) _envelope->error = value;
+        if (name == "result" && !_envelope->result) _envelope->result = value;
+    }
 
     // After an element: "," and another element, or the closing bracket.
     ScanError separator(char closing, ScanError notClosed) {
@@ -179,16 +192,23 @@ private:
 
     std::string_view _text;
     std::size_t _at;
+    Envelope* _envelope;  // null, or where the members of the top-level object are noted
     int _depth = 0;
 };
 
 }  // namespace
 
-ScanError check(std::string_view text) {
-    Scanner scanner(text);
+ScanError check(std::string_view text, Envelope& envelope) {
+    envelope = Envelope();
+    Scanner scanner(text, 0, &envelope);
     if (ScanError e = scanner.value(); e != kOk) return e;
     scanner.skipSpace();
     return scanner.atEnd() ? kOk : kTrailingCharacters;
+}
+
+ScanError check(std::string_view text) {
+    Envelope unused;
+    return check(text, unused);
 }
 
 std::optional<std::size_t> findMember(std::string_view text, std::string_view name) {

@@ -30,6 +30,17 @@ inline constexpr int kMaxDepth = 128;
 
 ScanError check(std::string_view text);
 
+// The values of the first top-level members named "error" and "result", each exactly as written;
+// nothing for a member that is absent or when the text is no object.
+struct Envelope {
+    std::optional<std::string_view> error;
+    std::optional<std::string_view> result;
+};
+
+// check(), which finds the members of the envelope in the same walk; they are valid only when
+// the text passes.
+ScanError check(std::string_view text, Envelope& envelope);
+
 // Position of the value of the first member `name` of the top-level object; nothing when the
 // text is no object, the member is absent, or the object is malformed before it.
 std::optional<std::size_t> findMember(std::string_view text, std::string_view name);

@@ -113,19 +113,34 @@ std::string RemoteClientApiWrapper::getRemoteJsonResponse(const std::string& pat
     return mapped("zrhorlo::RemoteClientApiWrapper::getRemoteJsonResponse", [&] { return _transport->get(path); });
 }
 
-std::string RemoteClientApiWrapper::getRemoteData(const std::string& path) {
-    std::string data;
-    if (!zrjson::getObjectMemberText(getRemoteJsonResponse(path), "data", data))
+void RemoteClientApiWrapper::getRemoteData(const std::string& path, zrjsonlh::CppJson& data) {
+    if (!zrjson::getObjectMember(getRemoteJsonResponse(path), "data", data))
         throw ZRERR_RAISE(tiktalerr_rsrcUnavailable)
             .debug("message", kParseFailure)
             .debug("resourceUri", path)
             .debug("deviceAddress", _host);
-    return data;
+}
+
+std::string RemoteClientApiWrapper::getRemoteData(const std::string& path) {
+    zrjsonlh::CppJson data;
+    getRemoteData(path, data);
+    return zrjsonlh::printUnformatted(data.get());
 }
 
 void RemoteClientApiWrapper::getSvcAttr(const std::string& attribute, std::string* svcAttrJsonOut) {
     requireOutput(svcAttrJsonOut, "svcAttrJsonOut");
-    *svcAttrJsonOut = getRemoteData(encode(_deviceName) + "?attribute=" + encode(attribute));
+    zrjsonlh::CppJson data;
+    getSvcAttrData(attribute, data);
+    *svcAttrJsonOut = zrjsonlh::printUnformatted(data.get());
+}
+
+void RemoteClientApiWrapper::getSvcAttrData(const std::string& attribute, zrjsonlh::CppJson& svcAttrOut) {
+    getRemoteData(encode(_deviceName) + "?attribute=" + encode(attribute), svcAttrOut);
+}
+
+void RemoteClientApiWrapper::getTrAttrData(const std::string& trId, const std::string& attribute,
+                                           zrjsonlh::CppJson& trAttrOut) {
+    getRemoteData(encode(_deviceName) + "/" + encode(trId) + "/" + encode(attribute), trAttrOut);
 }
 
 void RemoteClientApiWrapper::getSvcMetadata(std::string* svcMetadataJsonOut) {
@@ -135,7 +150,9 @@ void RemoteClientApiWrapper::getSvcMetadata(std::string* svcMetadataJsonOut) {
 
 void RemoteClientApiWrapper::getTrAttr(const std::string& trId, const std::string& attribute, std::string* trAttrJsonOut) {
     requireOutput(trAttrJsonOut, "trAttrJsonOut");
-    *trAttrJsonOut = getRemoteData(encode(_deviceName) + "/" + encode(trId) + "/" + encode(attribute));
+    zrjsonlh::CppJson data;
+    getTrAttrData(trId, attribute, data);
+    *trAttrJsonOut = zrjsonlh::printUnformatted(data.get());
 }
 
 void RemoteClientApiWrapper::getTrMetadata(const std::string& trId, std::string* trMetadataJsonOut) {
@@ -156,15 +173,14 @@ std::int32_t RemoteClientApiWrapper::getApiVersion() {
 }
 
 bool RemoteClientApiWrapper::getSvcAttrText(const char* key, std::string& out) {
-    std::string data;
-    getSvcAttr(key, &data);
-    const zrjsonlh::CppJson json(data.c_str());
-    const cJSON* member = cJSON_GetObjectItem(json.get(), key);
+    zrjsonlh::CppJson data;
+    getSvcAttrData(key, data);
+    const cJSON* member = cJSON_GetObjectItem(data.get(), key);
     if (!member)
         throw ZRERR_RAISE(zrhorloerr_attrNotFound)
             .debug("message", kParseFailure)
             .debug("deviceAddress", _host)
-            .debug("jsonReceived", data)
+            .debug("jsonReceived", zrjsonlh::printUnformatted(data.get()))
             .debug("desiredJsonKey", key);
     if (cJSON_IsNull(member)) return false;
     try {
@@ -172,7 +188,7 @@ bool RemoteClientApiWrapper::getSvcAttrText(const char* key, std::string& out) {
     } catch (const zrerr::ExceptionBase& e) {
         throw ZRERR_RAISE(zrhorloerr_attrNotFound)
             .debug("message", "Failed to parse JSON value as a string.")
-            .debug("jsonReceived", data)
+            .debug("jsonReceived", zrjsonlh::printUnformatted(data.get()))
             .debug("desiredJsonKey", key)
             .debug("originalErrorCode", e.code());
     }

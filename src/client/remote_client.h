@@ -10,6 +10,9 @@
 namespace zr::vantle::shared {
 class iCURL;
 }
+namespace zrjsonlh {
+class CppJson;
+}
 
 namespace zrhorlo {
 
@@ -59,10 +62,16 @@ public:
     void restartTr(const std::string& trId) override;
     ViStatus adjustTime(ViUInt64 timeReferenceNanos, ViUInt64 timeKeeperNanos) override;
 
+    // getSvcAttr and getTrAttr with the "data" object parsed, for the session, which reads its
+    // members: a text would only be parsed again.
+    void getSvcAttrData(const std::string& attribute, zrjsonlh::CppJson& svcAttrOut);
+    void getTrAttrData(const std::string& trId, const std::string& attribute, zrjsonlh::CppJson& trAttrOut);
+
     const std::string& deviceName() const { return _deviceName; }
 
 private:
     std::string getRemoteJsonResponse(const std::string& path);
+    void getRemoteData(const std::string& path, zrjsonlh::CppJson& data);
     std::string getRemoteData(const std::string& path);
     // The text of a nullable string member of a service attribute; false when it is null.
     bool getSvcAttrText(const char* key, std::string& out);

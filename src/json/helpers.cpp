@@ -9,27 +9,35 @@
 namespace zrjson {
 namespace {
 
-// The member, or null when it is absent (also when the text is no object).
-cJSON* findMember(const zrjsonlh::CppJson& json, const char* name) { return cJSON_GetObjectItem(json.get(), name); }
+// A parsed object and the text it came from, which failures show; without the text (an object
+// parsed before) they show its unformatted print.
+struct Source {
+    const cJSON* object;
+    const std::string* text;
 
-zrerr::Exception typeMismatch(const std::string& jsonText, const char* name, const char* message) {
+    std::string shown() const { return text ? *text : zrjsonlh::printUnformatted(object); }
+};
+
+// The member, or null when it is absent (also when the object is none).
+const cJSON* findMember(const Source& source, const char* name) { return cJSON_GetObjectItem(source.object, name); }
+
+zrerr::Exception typeMismatch(const Source& source, const char* name, const char* message) {
     return zrerr::raise(zrjsonlh::jsonErrorsTypeMismatch, "errCode", ZRERR_FILE, __LINE__)
         .debug("message", message)
-        .debug("JSON", jsonText.c_str())
+        .debug("JSON", source.shown())
         .debug("key", name);
 }
 
 // The member readers: false when absent, a null member as `onNull` says; a value of another type
 // fails with -52004 naming the text and the key.
 template <class Value>
-bool readMember(const std::string& jsonText, const char* name, Value& out, cJSON_bool (*hasType)(const cJSON*),
+bool readMember(const Source& source, const char* name, Value& out, cJSON_bool (*hasType)(const cJSON*),
                 Value (*convert)(const cJSON*), OnNull onNull) {
-    const zrjsonlh::CppJson json(jsonText.c_str());
-    const cJSON* member = findMember(json, name);
+    const cJSON* member = findMember(source, name);
     if (!member) return false;
     if (cJSON_IsNull(member) && onNull == OnNull::keepOutput) return true;
     if (!hasType(member))
-        throw typeMismatch(jsonText, name, "Error parsing: expected data type does not match the parsed value.");
+        throw typeMismatch(source, name, "Error parsing: expected data type does not match the parsed value.");
     out = convert(member);
     return true;
 }
@@ -44,33 +52,75 @@ bool allFinite(const cJSON* item) {
 
 bool toBool(const cJSON* item) { return cJSON_IsTrue(item); }
 
+bool readString(const Source& source, const char* name, std::string& out, OnNull onNull) {
+    return readMember(source, name, out, cJSON_IsString, zrjsonlh::getString, onNull);
+}
+
+bool readInt32Number(const Source& source, const char* name, std::int32_t& out, OnNull onNull) {
+    return readMember(source, name, out, cJSON_IsNumber, zrjsonlh::getInt32, onNull);
+}
+
+bool readBool(const Source& source, const char* name, bool& out) {
+    return readMember(source, name, out, cJSON_IsBool, toBool, OnNull::keepOutput);
+}
+
+std::int32_t readInt32(const Source& source, const char* name) {
+    const cJSON* member = findMember(source, name);
+    if (cJSON_IsString(member)) return boost::lexical_cast<std::int32_t>(member->valuestring);
+    if (cJSON_IsNumber(member)) return zrjsonlh::getInt32(member);
+    throw ZRERR_RAISE(tiktalerr_internalSoftware)
+        .debug("message", "Could not cast JSON value to int32 or an JSON object was invalid")
+        .debug("key", name)
+        .debug("JSON", source.shown());
+}
+
 }  // namespace
 
 bool getStringMember(const std::string& jsonText, const char* name, std::string& out, OnNull onNull) {
-    return readMember(jsonText, name, out, cJSON_IsString, zrjsonlh::getString, onNull);
+    const zrjsonlh::CppJson json(jsonText.c_str());
+    return readString({json.get(), &jsonText}, name, out, onNull);
+}
+
+bool getStringMember(const cJSON* object, const char* name, std::string& out, OnNull onNull) {
+    return readString({object, nullptr}, name, out, onNull);
 }
 
 bool getInt32NumberMember(const std::string& jsonText, const char* name, std::int32_t& out, OnNull onNull) {
-    return readMember(jsonText, name, out, cJSON_IsNumber, zrjsonlh::getInt32, onNull);
+    const zrjsonlh::CppJson json(jsonText.c_str());
+    return readInt32Number({json.get(), &jsonText}, name, out, onNull);
+}
+
+bool getInt32NumberMember(const cJSON* object, const char* name, std::int32_t& out, OnNull onNull) {
+    return readInt32Number({object, nullptr}, name, out, onNull);
 }
 
 bool getBoolMember(const std::string& jsonText, const char* name, bool& out) {
-    return readMember(jsonText, name, out, cJSON_IsBool, toBool, OnNull::keepOutput);
+    const zrjsonlh::CppJson json(jsonText.c_str());
+    return readBool({json.get(), &jsonText}, name, out);
+}
+
+bool getBoolMember(const cJSON* object, const char* name, bool& out) { return readBool({object, nullptr}, name, out); }
+
+bool getObjectMember(const std::string& jsonText, const char* name, zrjsonlh::CppJson& out) {
+    const zrjsonlh::CppJson json(jsonText.c_str());
+    cJSON* member = cJSON_GetObjectItem(json.get(), name);
+    if (!member) return false;
+    zrjsonlh::checkObject(member);
+    if (!allFinite(member)) throw typeMismatch({json.get(), &jsonText}, name, "A number is beyond the range of a double.");
+    out.reset(cJSON_DetachItemViaPointer(json.get(), member));
+    return true;
 }
 
 bool getObjectMemberText(const std::string& jsonText, const char* name, std::string& out) {
-    const zrjsonlh::CppJson json(jsonText.c_str());
-    const cJSON* member = findMember(json, name);
-    if (!member) return false;
-    zrjsonlh::checkObject(member);
-    if (!allFinite(member)) throw typeMismatch(jsonText, name, "A number is beyond the range of a double.");
-    out = zrjsonlh::printUnformatted(member);
+    zrjsonlh::CppJson member;
+    if (!getObjectMember(jsonText, name, member)) return false;
+    out = zrjsonlh::printUnformatted(member.get());
     return true;
 }
 
 bool getStringArrayMember(const std::string& jsonText, const char* name, std::vector<std::string>& out) {
     const zrjsonlh::CppJson json(jsonText.c_str());
-    const cJSON* member = findMember(json, name);
+    const cJSON* member = cJSON_GetObjectItem(json.get(), name);
     if (!member) return false;
     if (cJSON_IsNull(member)) return true;
     std::vector<std::string> texts;
@@ -82,13 +132,9 @@ bool getStringArrayMember(const std::string& jsonText, const char* name, std::ve
 
 std::int32_t getInt32Member(const std::string& jsonText, const char* name) {
     const zrjsonlh::CppJson json(jsonText.c_str());
-    const cJSON* member = findMember(json, name);
-    if (cJSON_IsString(member)) return boost::lexical_cast<std::int32_t>(member->valuestring);
-    if (cJSON_IsNumber(member)) return zrjsonlh::getInt32(member);
-    throw ZRERR_RAISE(tiktalerr_internalSoftware)
-        .debug("message", "Could not cast JSON value to int32 or an JSON object was invalid")
-        .debug("key", name)
-        .debug("JSON", jsonText.c_str());
+    return readInt32({json.get(), &jsonText}, name);
 }
+
+std::int32_t getInt32Member(const cJSON* object, const char* name) { return readInt32({object, nullptr}, name); }
 
 }  // namespace zrjson

@@ -10,6 +10,7 @@
 #include "client/remote_client.h"
 #include "errors/zrerr.h"
 #include "json/helpers.h"
+#include "json/zrjsonlh.h"
 #include "tsession/enums.h"
 
 namespace tiktal {
@@ -25,10 +26,10 @@ void requireOutput(const void* value) {
     if (!value) throw ZRERR_RAISE(tiktalerr_invParameter).debug("message", kMissingParameter).debug("value", "NULL");
 }
 
-[[noreturn]] void missingMember(const std::string& json, const std::string& key, const char* message = nullptr) {
+[[noreturn]] void missingMember(const zrjsonlh::CppJson& data, const std::string& key, const char* message = nullptr) {
     throw ZRERR_RAISE(tiktalerr_internalSoftware)
         .debug("message", message ? message : kParseFailure)
-        .debug("json", json)
+        .debug("json", zrjsonlh::printUnformatted(data.get()))
         .debug("key", key);
 }
 
@@ -70,11 +71,9 @@ std::string HorloSession::getMetaDataKey(ViConstString terminalName, ViAttr attr
     return record.getMetaDataAttrKey(trType);
 }
 
-std::string HorloSession::getTrAttr(ViConstString terminalName, const std::string& key) {
+void HorloSession::getTrAttr(ViConstString terminalName, const std::string& key, zrjsonlh::CppJson& data) {
     if (!terminalName) throw ZRERR_RAISE(tiktalerr_terminalNotSpecified).debug("func", "tiktal::HorloSession::getTrAttr");
-    std::string json;
-    client->getTrAttr(terminalName, key, &json);
-    return json;
+    client->getTrAttrData(terminalName, key, data);
 }
 
 std::string HorloSession::getTrType(ViConstString trName) {
@@ -99,9 +98,10 @@ std::string HorloSession::getSelectedTrType() {
 }
 
 std::string HorloSession::readTrAttrText(ViConstString terminalName, const std::string& key, const char* missing) {
-    const std::string json = getTrAttr(terminalName, key);
+    zrjsonlh::CppJson data;
+    getTrAttr(terminalName, key, data);
     std::string text;
-    if (!zrjson::getStringMember(json, key.c_str(), text, zrjson::OnNull::fail)) missingMember(json, key, missing);
+    if (!zrjson::getStringMember(data.get(), key.c_str(), text, zrjson::OnNull::fail)) missingMember(data, key, missing);
     return text;
 }
 
@@ -139,27 +139,28 @@ void HorloSession::getAttributeViInt32(ViConstString terminalName, ViAttr attrib
         *value = getPtpClockAccuracyFromString(readTrAttrText(terminalName, key));
         return;
     case Enumeration::GptpClockAccuracy: {
-        const std::string json = getTrAttr(terminalName, key);
+        zrjsonlh::CppJson data;
+        getTrAttr(terminalName, key, data);
         std::string text;
         try {
-            if (!zrjson::getStringMember(json, key.c_str(), text, zrjson::OnNull::fail)) missingMember(json, key);
+            if (!zrjson::getStringMember(data.get(), key.c_str(), text, zrjson::OnNull::fail)) missingMember(data, key);
             *value = getClockAccuracyCodeFromString(text);
         } catch (const zrerr::ExceptionBase& e) {
             if (e.code() != -52004) throw;
             // The service sent the code as a number.
-            zrjson::getInt32NumberMember(json, key.c_str(), *value, zrjson::OnNull::fail);
+            zrjson::getInt32NumberMember(data.get(), key.c_str(), *value, zrjson::OnNull::fail);
         }
         return;
     }
     case Enumeration::None:
         break;
     }
-    if (attribute == TIKTAL_ATTR_8021AS_NEIGHBOR_PROP_DELAY_THRESHOLD) {
-        *value = zrjson::getInt32Member(getTrAttr(terminalName, key), key.c_str());
-    } else {
-        const std::string json = getTrAttr(terminalName, key);
-        if (!zrjson::getInt32NumberMember(json, key.c_str(), *value, zrjson::OnNull::fail)) missingMember(json, key);
-    }
+    zrjsonlh::CppJson data;
+    getTrAttr(terminalName, key, data);
+    if (attribute == TIKTAL_ATTR_8021AS_NEIGHBOR_PROP_DELAY_THRESHOLD)
+        *value = zrjson::getInt32Member(data.get(), key.c_str());
+    else if (!zrjson::getInt32NumberMember(data.get(), key.c_str(), *value, zrjson::OnNull::fail))
+        missingMember(data, key);
 }
 
 void HorloSession::getAttributeViReal64(ViConstString terminalName, ViAttr attribute, ViReal64* value) {
@@ -187,9 +188,10 @@ void HorloSession::getAttributeViBoolean(ViConstString terminalName, ViAttr attr
         *value = getSelectedTrId() == terminalName ? VI_TRUE : VI_FALSE;
         return;
     }
-    const std::string json = getTrAttr(terminalName, key);
+    zrjsonlh::CppJson data;
+    getTrAttr(terminalName, key, data);
     bool flag = false;  // a null member reads false
-    if (!zrjson::getBoolMember(json, key.c_str(), flag)) missingMember(json, key);
+    if (!zrjson::getBoolMember(data.get(), key.c_str(), flag)) missingMember(data, key);
     *value = flag ? VI_TRUE : VI_FALSE;
 }
 

@@ -3,6 +3,8 @@
 // time.
 #pragma once
 
+#include <cjson/cJSON.h>
+
 #include <memory>
 #include <mutex>
 #include <string>
@@ -13,6 +15,9 @@
 
 namespace zrhorlo {
 class RemoteClientApiWrapper;
+}
+namespace zrjsonlh {
+class CppJson;
 }
 
 namespace tiktal {
@@ -44,10 +49,13 @@ private:
     std::string getSelectedTrType();
     std::string getSelectedTrId();  // empty when none is selected
     std::int64_t getSelectedTrOffsetNanos();  // 0 when none is selected
-    std::string getTrAttr(ViConstString terminalName, const std::string& key);
+    // The parsed answer for `key` of the time reference `terminalName`, into `data`.
+    void getTrAttr(ViConstString terminalName, const std::string& key, zrjsonlh::CppJson& data);
     // The text member `key`; a missing one fails with `missing` as its message (null: the usual).
     std::string readTrAttrText(ViConstString terminalName, const std::string& key, const char* missing = nullptr);
     void writeTrAttr(ViConstString terminalName, const std::string& key, const std::string& valueText);
+    // The service's "allTimeReferences" member, held by `data`; null for a scalar, which lists none.
+    const cJSON* timeReferenceList(zrjsonlh::CppJson& data);
     std::vector<std::string> timeReferenceNames();
 
     std::string resourceName;

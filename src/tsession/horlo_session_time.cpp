@@ -15,24 +15,33 @@ constexpr std::uint64_t kNanosPerSecond = 1000000000;
 
 }  // namespace
 
+const cJSON* HorloSession::timeReferenceList(zrjsonlh::CppJson& data) {
+    client->getSvcAttrData("allTimeReferences", data);
+    const cJSON* names = zrjsonlh::getObjectItem(data.get(), "allTimeReferences");
+    return cJSON_IsArray(names) || cJSON_IsObject(names) ? names : nullptr;  // a scalar has no elements
+}
+
 std::vector<std::string> HorloSession::timeReferenceNames() {
-    std::string json;
-    client->getSvcAttr("allTimeReferences", &json);
-    const zrjsonlh::CppJson parsed(json.c_str());
-    const cJSON* names = zrjsonlh::getObjectItem(parsed.get(), "allTimeReferences");
+    zrjsonlh::CppJson data;
     std::vector<std::string> list;
-    if (!cJSON_IsArray(names) && !cJSON_IsObject(names)) return list;  // a scalar has no elements
-    for (auto it = zrjsonlh::ArrayIterator::begin(names); it != zrjsonlh::ArrayIterator::end(); ++it)
-        list.push_back(zrjsonlh::getString(*it));
+    if (const cJSON* names = timeReferenceList(data))
+        for (auto it = zrjsonlh::ArrayIterator::begin(names); it != zrjsonlh::ArrayIterator::end(); ++it)
+            list.push_back(zrjsonlh::getString(*it));
     return list;
 }
 
 void HorloSession::getTimeReferenceNames(std::string& valueString) {
     const Lock hold(_lock);
-    const std::vector<std::string> names = timeReferenceNames();
+    zrjsonlh::CppJson data;
     std::string joined;
-    for (std::size_t i = 0; i < names.size(); ++i) joined += (i == 0 ? "" : ",") + names[i];
-    valueString = joined;
+    const char* separator = "";  // "," before every name but the first
+    if (const cJSON* names = timeReferenceList(data))
+        for (auto it = zrjsonlh::ArrayIterator::begin(names); it != zrjsonlh::ArrayIterator::end(); ++it) {
+            zrjsonlh::checkString(*it);
+            joined.append(separator).append((*it)->valuestring);
+            separator = ",";
+        }
+    valueString = std::move(joined);
 }
 
 void HorloSession::getTime(ViUInt32* timeSeconds, ViUInt32* timeNanoseconds, ViUInt16* timeFractionalNanoseconds) {
@@ -41,12 +50,13 @@ void HorloSession::getTime(ViUInt32* timeSeconds, ViUInt32* timeNanoseconds, ViU
             .debug("message", zrerr::kMissingParameter)
             .debug("func", "tiktal::HorloSession::getTime");
     const Lock hold(_lock);
-    std::string json, text;
-    client->getSvcAttr("epochOffsetInNsec", &json);
-    if (!zrjson::getStringMember(json, "epochOffsetInNsec", text))
+    zrjsonlh::CppJson data;
+    std::string text;
+    client->getSvcAttrData("epochOffsetInNsec", data);
+    if (!zrjson::getStringMember(data.get(), "epochOffsetInNsec", text))
         throw ZRERR_RAISE(tiktalerr_internalSoftware)
             .debug("message", "Failed to parse attribute from Horlo metadata.")
-            .debug("json", json)
+            .debug("json", zrjsonlh::printUnformatted(data.get()))
             .debug("key", "epochOffsetInNsec");
     // The count is never negative: "-0" is 0, and "-n" fails as any other text that is no count.
     const std::uint64_t nanos = boost::lexical_cast<std::uint64_t>(text);

@@ -66,6 +66,16 @@ TEST(Envelope, FindsMembersByDecodedNameAndReadsValues) {
     EXPECT_FALSE(env::findMember("[1]", "result").has_value());
     EXPECT_FALSE(env::findMember(R"({"a":1 "result":2})", "result").has_value());  // malformed before it
 
+    // The walk of the whole check notes the same values: the first of each name, at the top only.
+    env::Envelope members;
+    ASSERT_EQ(env::check(text, members), env::kOk);
+    EXPECT_EQ(members.error, env::valueText(text, *error));
+    EXPECT_EQ(members.result, env::valueText(text, *env::findMember(text, "result")));
+    ASSERT_EQ(env::check(R"({"result" : 1 ,"result":2})", members), env::kOk);
+    EXPECT_EQ(members.result, "1");
+    ASSERT_EQ(env::check(R"([{"result":1,"error":2}])", members), env::kOk);
+    EXPECT_FALSE(members.result || members.error);
+
     const std::string scalars =
         R"({"t":true,"n":"7","big":1e12,"i":42,"s":5,"w":-5.0e0,"huge":1e400,"digits":)" + std::string(400, '9') + "}";
     const auto whole = [&](const char* name) { return env::readWholeNumber(scalars, *env::findMember(scalars, name)); };
