@@ -191,7 +191,9 @@ OsError setWholeFileLock(int descriptor, short type) noexcept {
 }
 
 // The longest pause between two tries to take a lock that another open file holds.
-constexpr std::chrono::milliseconds kLongestLockPause{10};
+// Short: a process that loads in a loop leaves the lock free only for the few milliseconds
+// between two loads, and a waiter that sleeps longer than that may never get it.
+constexpr std::chrono::microseconds kLongestLockPause{1000};
 
 // Writes the whole of `data` from the start of the file.
 OsError writeAll(int descriptor, const char* data, std::size_t size) noexcept {
@@ -253,7 +255,7 @@ void File::close() noexcept {
 OsError File::lock(std::chrono::milliseconds limit) noexcept {
     using Clock = std::chrono::steady_clock;
     const Clock::time_point deadline = Clock::now() + limit;
-    for (std::chrono::milliseconds pause{1};; pause = std::min(2 * pause, kLongestLockPause)) {
+    for (std::chrono::microseconds pause{100};; pause = std::min(2 * pause, kLongestLockPause)) {
         const OsError error = setWholeFileLock(_descriptor, F_WRLCK);
         if (!error) _locked = true;
         if (error.code != EAGAIN) return error;
