@@ -18,7 +18,9 @@
 #include <new>
 #include <algorithm>
 #include <climits>
+#include <functional>
 #include <pthread.h>
+#include <random>
 #include <thread>
 #include <unistd.h>
 #include <vector>
@@ -175,14 +177,20 @@ OsError makeDirectories(const std::string& path) {
 
 namespace {
 
-// Sets or clears the lock over the whole file (start 0, length 0: to the end, however it grows)
-// without waiting: EAGAIN when another open file holds a lock in the way.
-OsError setWholeFileLock(int descriptor, short type) noexcept {
+// Waiters for a file's lock each hold a shared lock on this byte, far beyond any content, so that
+// a newcomer sees them and waits in line with them rather than taking the lock the moment it is
+// free: a process that loads in a loop would otherwise take it again each time before any
+// waiter's next try, for good.
+constexpr off_t kWaitersByte = off_t{1} << 62;
+
+// Sets or clears a lock on `length` bytes from `start` (length 0: to the end, however the file
+// grows) without waiting: EAGAIN when another open file holds a lock in the way.
+OsError setLock(int descriptor, short type, off_t start, off_t length) noexcept {
     struct flock range {};
     range.l_type = type;
     range.l_whence = SEEK_SET;
-    range.l_start = 0;
-    range.l_len = 0;
+    range.l_start = start;
+    range.l_len = length;
     while (::fcntl(descriptor, F_OFD_SETLK, &range) != 0) {
         if (errno == EACCES) return {"fcntl", EAGAIN};  // the other answer POSIX allows for a conflict
         if (errno != EINTR) return {"fcntl", errno};
@@ -190,10 +198,27 @@ OsError setWholeFileLock(int descriptor, short type) noexcept {
     return {};
 }
 
-// The longest pause between two tries to take a lock that another open file holds.
-// Short: a process that loads in a loop leaves the lock free only for the few milliseconds
-// between two loads, and a waiter that sleeps longer than that may never get it.
-constexpr std::chrono::microseconds kLongestLockPause{1000};
+// The file's lock: everything before the waiters' byte (every byte of any real content).
+OsError setFileLock(int descriptor, short type) noexcept { return setLock(descriptor, type, 0, kWaitersByte); }
+
+// Whether another open file holds a lock on the waiters' byte: someone is waiting for the lock
+// (or holds a lock over the whole file, which is just as much in the way).
+bool othersWait(int descriptor) noexcept {
+    struct flock range {};
+    range.l_type = F_WRLCK;
+    range.l_whence = SEEK_SET;
+    range.l_start = kWaitersByte;
+    range.l_len = 1;
+    return ::fcntl(descriptor, F_OFD_GETLK, &range) == 0 && range.l_type != F_UNLCK;
+}
+
+// A pause between two tries of a waiter: 0.5 to 1.5 ms, drawn anew each time so that no waiter
+// keeps a turn that always comes just after the lock is taken again.
+std::chrono::microseconds nextLockPause() noexcept {
+    thread_local std::minstd_rand draw(static_cast<std::minstd_rand::result_type>(
+        std::hash<std::thread::id>{}(std::this_thread::get_id()) ^ static_cast<std::size_t>(::getpid())));
+    return std::chrono::microseconds(500 + draw() % 1000);
+}
 
 // Writes the whole of `data` from the start of the file.
 OsError writeAll(int descriptor, const char* data, std::size_t size) noexcept {
@@ -250,23 +275,30 @@ void File::close() noexcept {
     _locked = false;
 }
 
-// Tried again after growing pauses rather than waited for in the kernel, whose wait only a signal
-// could end before the lock is free.
+// Tried again after short pauses rather than waited for in the kernel, whose wait only a signal
+// could end before the lock is free. While others wait, a newcomer does not try at once but
+// waits in line with them, each try after a pause of chance length.
 OsError File::lock(std::chrono::milliseconds limit) noexcept {
     using Clock = std::chrono::steady_clock;
     const Clock::time_point deadline = Clock::now() + limit;
-    for (std::chrono::microseconds pause{100};; pause = std::min(2 * pause, kLongestLockPause)) {
-        const OsError error = setWholeFileLock(_descriptor, F_WRLCK);
-        if (!error) _locked = true;
-        if (error.code != EAGAIN) return error;
-        const Clock::time_point now = Clock::now();
-        if (now >= deadline) return {"fcntl", ETIMEDOUT};
-        std::this_thread::sleep_for(std::min<Clock::duration>(pause, deadline - now));
+    OsError error{"fcntl", EAGAIN};
+    if (!othersWait(_descriptor)) error = setFileLock(_descriptor, F_WRLCK);
+    if (error.code == EAGAIN) {
+        // Failing to join the line only means that later comers do not see this waiter.
+        (void)setLock(_descriptor, F_RDLCK, kWaitersByte, 1);
+        for (Clock::time_point now = Clock::now(); error.code == EAGAIN && now < deadline; now = Clock::now()) {
+            std::this_thread::sleep_for(std::min<Clock::duration>(nextLockPause(), deadline - now));
+            error = setFileLock(_descriptor, F_WRLCK);
+        }
+        (void)setLock(_descriptor, F_UNLCK, kWaitersByte, 1);
+        if (error.code == EAGAIN) error = {"fcntl", ETIMEDOUT};
     }
+    if (!error) _locked = true;
+    return error;
 }
 
 OsError File::unlock() noexcept {
-    const OsError error = setWholeFileLock(_descriptor, F_UNLCK);
+    const OsError error = setFileLock(_descriptor, F_UNLCK);
     if (!error) _locked = false;
     return error;
 }
@@ -439,7 +471,7 @@ OsError File::replace(const std::string& text) {
     if (::fstat(_descriptor, &old) != 0) return fail({"fstat", errno});
     if (OsError error = takeOver(descriptor, old)) return fail(error);
     if (_locked) {
-        if (OsError error = setWholeFileLock(descriptor, F_WRLCK)) return fail(error);
+        if (OsError error = setFileLock(descriptor, F_WRLCK)) return fail(error);
     }
     if (OsError error = writeAll(descriptor, text.data(), text.size())) return fail(error);
     if (::fsync(descriptor) != 0) return fail({"fsync", errno});

@@ -165,7 +165,9 @@ public:
     const std::string& path() const noexcept { return _path; }
 
     // Waits until this open file holds the exclusive lock, at most `limit`: ETIMEDOUT when other
-    // open files held a lock on it (shared or exclusive) all that time.
+    // open files held a lock on it (shared or exclusive) all that time. Waiters take turns: one
+    // that comes while others wait waits behind them, so no one holding and taking the lock
+    // again at once keeps it from them for good.
     OsError lock(std::chrono::milliseconds limit) noexcept;
     OsError unlock() noexcept;
 

@@ -8,6 +8,7 @@
 
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <cerrno>
 #include <chrono>
 #include <functional>
@@ -316,6 +317,22 @@ TEST(ConfigFile, LockWaitsForAnotherLockOnlyUpToItsLimit) {
     letGo.join();
     EXPECT_TRUE(lockedElsewhere(path));
     file.unlock();
+
+    // Nor is a waiter kept out for good by a holder that lets go and takes the lock again at once.
+    std::atomic<bool> stop = false;
+    std::thread looping([&] {
+        LockableFile other(path, false);
+        while (!stop) {
+            other.lock();
+            std::this_thread::sleep_for(std::chrono::milliseconds(50));
+            other.unlock();
+        }
+    });
+    std::this_thread::sleep_for(std::chrono::milliseconds(50));
+    EXPECT_FALSE(failureOf([&] { file.lock(std::chrono::seconds(1)); }).raised) << "kept out for 1 s";
+    stop = true;
+    file.unlock();
+    looping.join();
 }
 
 TEST(ConfigFile, ALockerWhoseFileWasRemovedCreatesItAgainOrFails) {
