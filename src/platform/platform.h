@@ -1,5 +1,6 @@
-// The operating-system facilities the library uses. Each system has one backend file; nothing
-// outside this folder includes a system header for them.
+// The operating-system facilities the library uses. Each system has a folder of its own with one
+// file per facility (unix/, windows/); nothing outside this folder includes a system header for
+// them.
 #pragma once
 
 #include <chrono>
