@@ -30,9 +30,10 @@ zrerr::Exception typeMismatch(const Source& source, const char* name, const char
 
 // The member readers: false when absent, a null member as `onNull` says; a value of another type
 // fails with -52004 naming the text and the key.
-template <class Value>
-bool readMember(const Source& source, const char* name, Value& out, cJSON_bool (*hasType)(const cJSON*),
-                Value (*convert)(const cJSON*), OnNull onNull) {
+// (cJSON's own functions have cJSON's calling convention, which is not the default on every system.)
+template <class Value, class HasType>
+bool readMember(const Source& source, const char* name, Value& out, HasType hasType, Value (*convert)(const cJSON*),
+                OnNull onNull) {
     const cJSON* member = findMember(source, name);
     if (!member) return false;
     if (cJSON_IsNull(member) && onNull == OnNull::keepOutput) return true;
