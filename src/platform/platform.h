@@ -45,7 +45,15 @@ private:
 // Hands one whole line to the debug output; lines of concurrent writers never mix.
 void writeDebugOutput(const char* line, std::size_t length) noexcept;
 
-// Shared libraries loaded at run time. Failures return null and describe themselves in `error`.
+// Shared libraries loaded at run time. Failures return null and describe themselves in `error`,
+// the text of the system call named by kLoadLibraryApi or kFindSymbolApi.
+#if defined(_WIN32)
+constexpr char kLoadLibraryApi[] = "LoadLibraryA";
+constexpr char kFindSymbolApi[] = "GetProcAddress";
+#else
+constexpr char kLoadLibraryApi[] = "dlerror";
+constexpr char kFindSymbolApi[] = "dlerror";
+#endif
 void* loadLibrary(const std::string& path, std::string& error);
 void* findSymbol(void* library, const char* name, std::string& error);
 void unloadLibrary(void* library) noexcept;

@@ -159,7 +159,8 @@ OsError File::namesPath(bool& same) noexcept {
     same = false;
     BY_HANDLE_FILE_INFORMATION opened{}, named{};
     if (OsError error = identityOf(handleOf(_descriptor), opened)) return error;
-    const HANDLE file = CreateFileA(_path.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, FILE_FLAG_BACKUP_SEMANTICS, nullptr);
+    const HANDLE file =
+        CreateFileA(_path.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, FILE_FLAG_BACKUP_SEMANTICS, nullptr);
     if (file == INVALID_HANDLE_VALUE) {
         const DWORD error = GetLastError();
         if (error == ERROR_FILE_NOT_FOUND) return {};  // removed: the path names no file at all
