@@ -50,11 +50,19 @@ typedef const ViChar* ViRsrc;
 #ifndef VI_FALSE
 #define VI_FALSE ((ViBoolean)0)
 #endif
+/* On Windows every function is __stdcall, and the library's module-definition file names what it
+   exports; applications import. */
 #ifndef _VI_FUNC
+#if defined(_WIN32)
+#define _VI_FUNC __stdcall
+#else
 #define _VI_FUNC
 #endif
+#endif
 
-#if defined(_WIN32)
+#if defined(_WIN32) && defined(TIKTAL_BUILDING_LIBRARY)
+#define TIKTAL_API
+#elif defined(_WIN32)
 #define TIKTAL_API __declspec(dllimport)
 #elif defined(__GNUC__)
 #define TIKTAL_API __attribute__((visibility("default")))

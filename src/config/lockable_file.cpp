@@ -1,7 +1,6 @@
 #include "config/lockable_file.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdio>
 #include <cstring>
 
@@ -22,11 +21,11 @@ std::string folderOf(const std::string& path) {
 std::string whatIsWrong(const std::string& path, int error) {
     std::string target;
     switch (error) {
-    case EISDIR: return "The path is a folder";
-    case EINVAL: return "The path is not a regular file";
-    case ELOOP: return "The path leads through too many levels of links (a loop of links)";
-    case ENOTDIR: return "A part of the path on the way to the file is not a folder";
-    case ENOENT:
+    case platform::error::kIsAFolder: return "The path is a folder";
+    case platform::error::kInvalid: return "The path is not a regular file";
+    case platform::error::kLinkLoop: return "The path leads through too many levels of links (a loop of links)";
+    case platform::error::kNotAFolder: return "A part of the path on the way to the file is not a folder";
+    case platform::error::kNotFound:
         if (!platform::readLink(path, target)) return "The path is a dangling link to " + target;
         return "";
     default: return "";
@@ -58,7 +57,7 @@ LockableFile::~LockableFile() {
 // where another process may hold it open without sharing are not needed here.
 void LockableFile::open() {
     platform::OsError error = _file.open(_path, _create);
-    if (error.code == ENOENT && _create) {
+    if (error.code == platform::error::kNotFound && _create) {
         const std::string folder = folderOf(_path);
         if (const platform::OsError folderError = platform::makeDirectories(folder))
             ZRJSONCONFIG_FAILURE(kResourceNotFound)
@@ -84,9 +83,9 @@ void LockableFile::lock(std::chrono::milliseconds limit) {
     for (;;) {
         const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(deadline - Clock::now());
         if (const platform::OsError error = _file.lock(std::max(left, std::chrono::milliseconds(0)))) {
-            Failure failure = ZRJSONCONFIG_FAILURE(error.code == ETIMEDOUT ? kTimeout : kOsFault);
+            Failure failure = ZRJSONCONFIG_FAILURE(error.code == platform::error::kTimedOut ? kTimeout : kOsFault);
             failure.usage(kUsageTypeFilePath, _path).comment("Failed to lock file").osError(error);
-            if (error.code == ETIMEDOUT) failure.comment("Another process held a lock on the file for " + secondsText(limit));
+            if (error.code == platform::error::kTimedOut) failure.comment("Another process held a lock on the file for " + secondsText(limit));
             failure.raise();
         }
         bool current = false;
@@ -116,7 +115,7 @@ std::string LockableFile::read() {
     if (const platform::OsError error = _file.readAll(kMaxSize, text)) {
         Failure failure = ZRJSONCONFIG_FAILURE(kEndOfData);
         failure.usage(kUsageTypeFilePath, _path).comment("Failed to read file").osError(error);
-        if (error.code == EFBIG) failure.comment("The file is larger than 16 MiB");
+        if (error.code == platform::error::kFileTooLarge) failure.comment("The file is larger than 16 MiB");
         failure.raise();
     }
     return text;
@@ -128,7 +127,7 @@ void LockableFile::write(const std::string& text) {
             .usage(kUsageTypeFilePath, _path)
             .comment("Failed to write file")
             .comment("The new text of " + std::to_string(text.size()) + " bytes is larger than 16 MiB, which no process reads")
-            .osError({"write", EFBIG})
+            .osError({"write", platform::error::kFileTooLarge})
             .raise();
     if (const platform::OsError error = _file.replace(text)) {
         const bool flushing = std::strcmp(error.api, "fsync") == 0;

@@ -1,6 +1,5 @@
 #include "config/sync_fake_device_iterator.h"
 
-#include <cerrno>
 #include <new>
 
 #include "config/checked_json.h"
@@ -16,7 +15,7 @@ constexpr char kExtension[] = ".fake";
 constexpr char kNamePrefix[] = "FAKE:TIKTAL:";
 
 [[noreturn]] void failToRead(const std::string& path, const platform::OsError& error) {
-    if (error.code == EFBIG)
+    if (error.code == platform::error::kFileTooLarge)
         ZRJSONCONFIG_FAILURE(zrjsonconfig::kInvalidJson)
             .usage(kUsageTypeFilePath, path)
             .comment("The file is larger than 1 MiB")
@@ -47,7 +46,7 @@ std::string simulatedDeviceFile(const std::string& token) {
 }
 
 SyncFakeDeviceIterator::SyncFakeDeviceIterator() : _folder(platform::dataDirectory()) {
-    if (platform::listDirectory(_folder, _entries) == ENOMEM) throw std::bad_alloc();
+    if (platform::listDirectory(_folder, _entries) == platform::error::kNoMemory) throw std::bad_alloc();
     advance();
 }
 
@@ -64,7 +63,7 @@ void SyncFakeDeviceIterator::advance() {
         const std::string path = _folder + "/" + entry.name;
         std::string text;
         if (const platform::OsError error = platform::readRegularFile(path, kMaxFileSize, text)) {
-            if (error.code == ENOENT) continue;  // gone, or no longer a file, since the listing
+            if (error.code == platform::error::kNotFound) continue;  // gone, or no longer a file, since the listing
             failToRead(path, error);
         }
         _device = zrjsonconfig::parseObjectText(text, path);

@@ -29,8 +29,8 @@ zrerr::Exception typeMismatch(const Source& source, const char* name, const char
 }
 
 // The member readers: false when absent, a null member as `onNull` says; a value of another type
-// fails with -52004 naming the text and the key. `hasType` is one of cJSON's type tests, whose
-// calling convention cJSON's header chooses per system.
+// fails with -52004 naming the text and the key.
+// (cJSON's own functions have cJSON's calling convention, which is not the default on every system.)
 template <class Value, class HasType>
 bool readMember(const Source& source, const char* name, Value& out, HasType hasType, Value (*convert)(const cJSON*),
                 OnNull onNull) {

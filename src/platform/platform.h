@@ -3,6 +3,7 @@
 // them.
 #pragma once
 
+#include <cerrno>
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
@@ -44,7 +45,15 @@ private:
 // Hands one whole line to the debug output; lines of concurrent writers never mix.
 void writeDebugOutput(const char* line, std::size_t length) noexcept;
 
-// Shared libraries loaded at run time. Failures return null and describe themselves in `error`.
+// Shared libraries loaded at run time. Failures return null and describe themselves in `error`,
+// the text of the system call named by kLoadLibraryApi or kFindSymbolApi.
+#if defined(_WIN32)
+constexpr char kLoadLibraryApi[] = "LoadLibraryA";
+constexpr char kFindSymbolApi[] = "GetProcAddress";
+#else
+constexpr char kLoadLibraryApi[] = "dlerror";
+constexpr char kFindSymbolApi[] = "dlerror";
+#endif
 void* loadLibrary(const std::string& path, std::string& error);
 void* findSymbol(void* library, const char* name, std::string& error);
 void unloadLibrary(void* library) noexcept;
@@ -77,8 +86,9 @@ struct DeviceInterfaceEntry {
 // is no device interface and is passed over, as is one that goes away while the folder is read.
 // On failure, the call that failed, with `failedPath` the path it was given.
 OsError enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries, std::string& failedPath) noexcept;
-// The text of a small attribute file (at most 4 KiB, else EOVERFLOW), without its trailing line
-// feed; 0 or the error number (ENOENT when no regular file is there, as readRegularFile says).
+// The text of a small attribute file (at most 4 KiB, else error::kBufferTooSmall), without its trailing line
+// feed; 0 or the error number (error::kNotFound when no regular file is there, as readRegularFile
+// says).
 int readAttributeFile(const std::string& path, std::string& text) noexcept;
 
 // Whether something (a file, a folder, a link) is at `path`.
@@ -104,6 +114,36 @@ bool isModuleLoaded(void* module) noexcept;
 // Writes "Fatal Error: " + `text` as one line on standard error and ends the process at once with
 // exit status 1 (the process is in no state to run its exit handlers).
 [[noreturn]] void fatalError(const std::string& text) noexcept;
+
+// The error numbers of this system that the rest of the library tells apart: errno values on
+// Unix, the system error codes of GetLastError on Windows.
+namespace error {
+#if defined(_WIN32)
+constexpr int kNotFound = 2;          // ERROR_FILE_NOT_FOUND
+constexpr int kNotAFolder = 3;        // ERROR_PATH_NOT_FOUND: a part of the path is missing or no folder
+constexpr int kNoMemory = 8;          // ERROR_NOT_ENOUGH_MEMORY
+constexpr int kBufferTooSmall = 122;  // ERROR_INSUFFICIENT_BUFFER
+constexpr int kNotSupported = 50;     // ERROR_NOT_SUPPORTED
+constexpr int kInvalid = 87;          // ERROR_INVALID_PARAMETER
+constexpr int kFileTooLarge = 223;    // ERROR_FILE_TOO_LARGE
+constexpr int kTimedOut = 258;        // WAIT_TIMEOUT
+constexpr int kIsAFolder = 267;       // ERROR_DIRECTORY
+constexpr int kCancelled = 995;       // ERROR_OPERATION_ABORTED
+constexpr int kLinkLoop = 1921;       // ERROR_CANT_RESOLVE_FILENAME
+#else
+constexpr int kNotFound = ENOENT;
+constexpr int kNotAFolder = ENOTDIR;
+constexpr int kNoMemory = ENOMEM;
+constexpr int kBufferTooSmall = EOVERFLOW;
+constexpr int kNotSupported = EOPNOTSUPP;
+constexpr int kInvalid = EINVAL;
+constexpr int kFileTooLarge = EFBIG;
+constexpr int kTimedOut = ETIMEDOUT;
+constexpr int kIsAFolder = EISDIR;
+constexpr int kCancelled = ECANCELED;
+constexpr int kLinkLoop = ELOOP;
+#endif
+}  // namespace error
 
 // The platform status of an operating-system error number (0 for 0).
 std::int32_t statusOfOsError(int error) noexcept;
@@ -131,11 +171,11 @@ struct DirectoryEntry {
 };
 
 // The entries of the folder `path`, without "." and "..", sorted by name in byte order, so that
-// every file system gives the same order. 0, or the error number (ENOENT for a missing folder).
+// every file system gives the same order. 0, or the error number (error::kNotFound for a missing folder).
 int listDirectory(const std::string& path, std::vector<DirectoryEntry>& entries) noexcept;
 
-// The whole content of the regular file at `path`; a symbolic link is not followed. ENOENT when
-// no regular file is there (nothing, a link, a folder, a device), EFBIG when the file is longer
+// The whole content of the regular file at `path`; a symbolic link is not followed. error::kNotFound
+// when no regular file is there (nothing, a link, a folder, a device), error::kFileTooLarge when the file is longer
 // than `limit` bytes (nothing is kept), else the error number of the call that failed.
 OsError readRegularFile(const std::string& path, std::size_t limit, std::string& text) noexcept;
 

@@ -1,6 +1,5 @@
 #include "timing/interface_proxy.h"
 
-#include <cerrno>
 #include <cstring>
 #include <future>
 #include <memory>
@@ -50,12 +49,12 @@ std::uint32_t tDeviceInterfaceProxy::ioControl(std::uint32_t code, const void* i
 
 // The driver's transport carries control requests only.
 std::uint32_t tDeviceInterfaceProxy::read(void*, std::uint32_t, nZRAPALS100::tStatus& status) {
-    if (!status.isError()) mapOsError(EOPNOTSUPP, status, ZRERR_FILE, __LINE__);
+    if (!status.isError()) mapOsError(platform::error::kNotSupported, status, ZRERR_FILE, __LINE__);
     return 0;
 }
 
 std::uint32_t tDeviceInterfaceProxy::write(const void*, std::uint32_t, nZRAPALS100::tStatus& status) {
-    if (!status.isError()) mapOsError(EOPNOTSUPP, status, ZRERR_FILE, __LINE__);
+    if (!status.isError()) mapOsError(platform::error::kNotSupported, status, ZRERR_FILE, __LINE__);
     return 0;
 }
 
@@ -114,7 +113,7 @@ std::uint32_t tDeviceInterfaceProxy::beginWait(std::uint16_t arg1, std::uint32_t
             if (!waiting) return;
             // A cancelled wait has ended as asked; anything else is a failure of the driver.
             const int ended = context.wait.awaitEnd();
-            if (ended != 0 && ended != ECANCELED) mapOsError(ended, context.status, ZRERR_FILE, __LINE__);
+            if (ended != 0 && ended != platform::error::kCancelled) mapOsError(ended, context.status, ZRERR_FILE, __LINE__);
         });
     } catch (const std::system_error& e) {
         mapOsError(e.code().value(), status, ZRERR_FILE, __LINE__);
