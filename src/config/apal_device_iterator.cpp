@@ -91,8 +91,8 @@ void APALDeviceIterator::settle() {
 bool APALDeviceIterator::readCurrent() {
     const platform::DeviceInterfaceEntry& device = _entries[_index];
     _files.clear();
-    for (const BusFile& bus : kBusFiles) _files.push_back({device.pciFolder + "/" + bus.file});
-    _files.push_back({device.classFolder + "/serial_number"});
+    for (const BusFile& bus : kBusFiles) _files.push_back({device.pciFolder + "/" + bus.file, {}, 0});
+    _files.push_back({device.classFolder + "/serial_number", {}, 0});
     bool failed = false;
     for (FileRead& file : _files) {
         file.error = platform::readAttributeFile(file.path, file.text);

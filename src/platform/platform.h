@@ -45,7 +45,15 @@ private:
 // Hands one whole line to the debug output; lines of concurrent writers never mix.
 void writeDebugOutput(const char* line, std::size_t length) noexcept;
 
-// Shared libraries loaded at run time. Failures return null and describe themselves in `error`.
+// Shared libraries loaded at run time. Failures return null and describe themselves in `error`,
+// the text of the system call named by kLoadLibraryApi or kFindSymbolApi.
+#if defined(_WIN32)
+constexpr char kLoadLibraryApi[] = "LoadLibraryA";
+constexpr char kFindSymbolApi[] = "GetProcAddress";
+#else
+constexpr char kLoadLibraryApi[] = "dlerror";
+constexpr char kFindSymbolApi[] = "dlerror";
+#endif
 void* loadLibrary(const std::string& path, std::string& error);
 void* findSymbol(void* library, const char* name, std::string& error);
 void unloadLibrary(void* library) noexcept;
@@ -78,7 +86,7 @@ struct DeviceInterfaceEntry {
 // is no device interface and is passed over, as is one that goes away while the folder is read.
 // On failure, the call that failed, with `failedPath` the path it was given.
 OsError enumerateDeviceInterfaces(std::vector<DeviceInterfaceEntry>& entries, std::string& failedPath) noexcept;
-// The text of a small attribute file (at most 4 KiB, else EOVERFLOW), without its trailing line
+// The text of a small attribute file (at most 4 KiB, else error::kBufferTooSmall), without its trailing line
 // feed; 0 or the error number (error::kNotFound when no regular file is there, as readRegularFile
 // says).
 int readAttributeFile(const std::string& path, std::string& text) noexcept;
@@ -114,6 +122,7 @@ namespace error {
 constexpr int kNotFound = 2;          // ERROR_FILE_NOT_FOUND
 constexpr int kNotAFolder = 3;        // ERROR_PATH_NOT_FOUND: a part of the path is missing or no folder
 constexpr int kNoMemory = 8;          // ERROR_NOT_ENOUGH_MEMORY
+constexpr int kBufferTooSmall = 122;  // ERROR_INSUFFICIENT_BUFFER
 constexpr int kNotSupported = 50;     // ERROR_NOT_SUPPORTED
 constexpr int kInvalid = 87;          // ERROR_INVALID_PARAMETER
 constexpr int kFileTooLarge = 223;    // ERROR_FILE_TOO_LARGE
@@ -125,6 +134,7 @@ constexpr int kLinkLoop = 1921;       // ERROR_CANT_RESOLVE_FILENAME
 constexpr int kNotFound = ENOENT;
 constexpr int kNotAFolder = ENOTDIR;
 constexpr int kNoMemory = ENOMEM;
+constexpr int kBufferTooSmall = EOVERFLOW;
 constexpr int kNotSupported = EOPNOTSUPP;
 constexpr int kInvalid = EINVAL;
 constexpr int kFileTooLarge = EFBIG;

@@ -9,11 +9,11 @@ namespace {
 constexpr std::int32_t zrapalerr_invalidParameter = -52005;
 
 // A failure of the loader: -52005 with what the loader said, under "zrdynlib_debug".
-zrerr::Exception loaderFailure(int line, const char* what, const char* key, const std::string& value,
+zrerr::Exception loaderFailure(int line, const char* what, const char* key, const std::string& value, const char* api,
                                const std::string& loaderText) {
     zrerr::Exception internal;
     internal.setCode(zrapalerr_invalidParameter);
-    internal.addText("api", "dlerror");
+    internal.addText("api", api);
     internal.addText("string", loaderText.c_str());
     zrerr::Exception failure =
         zrerr::raise(zrapalerr_invalidParameter, "zrapalerr_invalidParameter", ZRERR_FILE, line, "zrdynlib_debug")
@@ -35,7 +35,9 @@ void AutoLib::load(const std::string& fileName) {
 bool AutoLib::load(const std::string& fileName, zrerr::ExceptionBase& status) {
     std::string error;
     _module = platform::loadLibrary(fileName, error);
-    if (!_module) status.merge(loaderFailure(__LINE__, "failed to zrdynlib_load library", "path", fileName, error));
+    if (!_module)
+        status.merge(loaderFailure(__LINE__, "failed to zrdynlib_load library", "path", fileName,
+                                   platform::kLoadLibraryApi, error));
     return _module != nullptr;
 }
 
@@ -45,7 +47,8 @@ bool AutoLib::resolveInOrder(const char* const* names, void** slots, std::size_t
         std::string error;
         slots[i] = platform::findSymbol(_module, names[i], error);
         if (!slots[i]) {
-            status.merge(loaderFailure(__LINE__, "failed to get symbol", "zrdynlib_symbol", names[i], error));
+            status.merge(loaderFailure(__LINE__, "failed to get symbol", "zrdynlib_symbol", names[i],
+                                       platform::kFindSymbolApi, error));
             return false;
         }
     }
@@ -57,7 +60,9 @@ void AutoLib::resolve(const char* const* names, void** slots, std::size_t count)
     for (std::size_t i = 0; i < count; ++i) {
         std::string error;
         slots[i] = platform::findSymbol(_module, names[i], error);
-        if (!slots[i]) overall.merge(loaderFailure(__LINE__, "failed to get symbol", "zrdynlib_symbol", names[i], error));
+        if (!slots[i])
+            overall.merge(loaderFailure(__LINE__, "failed to get symbol", "zrdynlib_symbol", names[i],
+                                        platform::kFindSymbolApi, error));
     }
     if (overall.code() < 0) throw overall;
 }

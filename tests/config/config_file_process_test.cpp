@@ -191,8 +191,11 @@ TEST(ConfigFileProcesses, AWriterKilledWhileWritingNeverLeavesAPartialFile) {
         // A file the writer had begun is left beside the configuration, never in its place.
         const std::vector<std::string> names = configtest::namesIn(machine.dataDirectory());
         if (names.size() > 1) ++killedWhileWriting;
-        for (const std::string& name : names)
-            if (name != "tiktal.config") EXPECT_EQ(name.rfind(".tiktal.config.", 0), 0u) << name;
+        for (const std::string& name : names) {
+            if (name != "tiktal.config") {
+                EXPECT_EQ(name.rfind(".tiktal.config.", 0), 0u) << name;
+            }
+        }
 
         LockableFile file(path, false);
         file.lock();  // the lock died with the writer

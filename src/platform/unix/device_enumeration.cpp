@@ -1,5 +1,6 @@
 // Device interfaces of the timing module: the sysfs layout below $TIKTAL_SYSROOT.
 #include "platform/platform.h"
+#include "platform/common.h"
 #include "platform/unix/unix.h"
 
 #include <limits.h>

@@ -116,13 +116,8 @@ OsError readRegularFile(const std::string& path, std::size_t limit, std::string&
     return error;
 }
 
-int listFolder(const std::string& path, std::vector<std::string>& names) {
-    std::vector<DirectoryEntry> entries;
-    const int error = listDirectory(path, entries);
-    names.clear();
-    for (DirectoryEntry& entry : entries) names.push_back(std::move(entry.name));
-    return error;
-}
+
+bool removeFile(const std::string& path) noexcept { return ::unlink(path.c_str()) == 0; }
 
 bool exists(const std::string& path) noexcept {
     struct stat status {};
@@ -138,10 +133,5 @@ OsError readLink(const std::string& path, std::string& target) {
     return {};
 }
 
-int readAttributeFile(const std::string& path, std::string& text) noexcept {
-    if (const OsError error = readRegularFile(path, 4096, text)) return error.code == EFBIG ? EOVERFLOW : error.code;
-    while (!text.empty() && (text.back() == '\n' || text.back() == '\r')) text.pop_back();
-    return 0;
-}
 
 }  // namespace platform

@@ -1,5 +1,6 @@
 // The configuration file: open-file-description locks and the crash-safe replace.
 #include "platform/platform.h"
+#include "platform/common.h"
 #include "platform/unix/unix.h"
 
 #include <fcntl.h>
@@ -10,8 +11,6 @@
 #include <cerrno>
 #include <chrono>
 #include <cstdlib>
-#include <functional>
-#include <random>
 #include <thread>
 
 namespace platform {
@@ -53,13 +52,6 @@ bool othersWait(int descriptor) noexcept {
     return ::fcntl(descriptor, F_OFD_GETLK, &range) == 0 && range.l_type != F_UNLCK;
 }
 
-// A pause between two tries of a waiter: 0.5 to 1.5 ms, drawn anew each time so that no waiter
-// keeps a turn that always comes just after the lock is taken again.
-std::chrono::microseconds nextLockPause() noexcept {
-    thread_local std::minstd_rand draw(static_cast<std::minstd_rand::result_type>(
-        std::hash<std::thread::id>{}(std::this_thread::get_id()) ^ static_cast<std::size_t>(::getpid())));
-    return std::chrono::microseconds(500 + draw() % 1000);
-}
 
 // Writes the whole of `data` from the start of the file.
 OsError writeAll(int descriptor, const char* data, std::size_t size) noexcept {
@@ -83,17 +75,6 @@ OsError syncFolder(const std::string& folder) noexcept {
     return error;
 }
 
-// Removes the temporary files that writers of `name` in `folder` left when they were killed before
-// their rename ("." + name + "." and six characters, as replace() makes them). Only a writer that
-// holds the file's lock makes one, so while the lock is held every such file is a leftover.
-void removeLeftovers(const std::string& folder, const std::string& name) {
-    const std::string prefix = "." + name + ".";
-    std::vector<std::string> names;
-    if (listFolder(folder, names) != 0) return;  // they stay until a later write
-    for (const std::string& entry : names)
-        if (entry.size() == prefix.size() + 6 && entry.compare(0, prefix.size(), prefix) == 0)
-            ::unlink((folder + "/" + entry).c_str());
-}
 
 }  // namespace
 

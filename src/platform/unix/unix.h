@@ -12,7 +12,5 @@ std::string sysroot();
 // The whole content of an open file from its start; a file longer than `limit` bytes is not
 // read: EFBIG, nothing kept. 0 or the error number.
 int readWhole(int descriptor, std::size_t limit, std::string& text);
-// The names in a folder, sorted, without "." and ".."; 0 or the error number.
-int listFolder(const std::string& path, std::vector<std::string>& names);
 
 }  // namespace platform

@@ -21,7 +21,8 @@ void DeviceChannel::close() noexcept {}
 bool DeviceChannel::isOpen() const noexcept { return false; }
 const std::string& DeviceChannel::path() const noexcept { return _state->path; }
 
-int DeviceChannel::control(std::uint32_t, const void*, std::uint32_t, void*, std::uint32_t, std::uint32_t& returned) noexcept {
+int DeviceChannel::control(std::uint32_t, const void*, std::uint32_t, void*, std::uint32_t,
+                           std::uint32_t& returned) noexcept {
     returned = 0;
     return error::kNotSupported;
 }

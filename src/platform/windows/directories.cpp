@@ -96,13 +96,6 @@ int listDirectory(const std::string& path, std::vector<DirectoryEntry>& entries)
     return error;
 }
 
-int listFolder(const std::string& path, std::vector<std::string>& names) {
-    std::vector<DirectoryEntry> entries;
-    const int error = listDirectory(path, entries);
-    names.clear();
-    for (DirectoryEntry& entry : entries) names.push_back(std::move(entry.name));
-    return error;
-}
 
 OsError readRegularFile(const std::string& path, std::size_t limit, std::string& text) noexcept {
     text.clear();
@@ -131,16 +124,12 @@ OsError readRegularFile(const std::string& path, std::size_t limit, std::string&
     return error;
 }
 
+bool removeFile(const std::string& path) noexcept { return DeleteFileA(path.c_str()) != 0; }
+
 bool exists(const std::string& path) noexcept { return GetFileAttributesA(path.c_str()) != INVALID_FILE_ATTRIBUTES; }
 
 // Links are not followed anywhere on Windows: no path is reported as a link.
 OsError readLink(const std::string&, std::string&) { return {"readlink", error::kInvalid}; }
 
-int readAttributeFile(const std::string& path, std::string& text) noexcept {
-    if (const OsError error = readRegularFile(path, 4096, text))
-        return error.code == error::kFileTooLarge ? ERROR_INSUFFICIENT_BUFFER : error.code;
-    while (!text.empty() && (text.back() == '\n' || text.back() == '\r')) text.pop_back();
-    return 0;
-}
 
 }  // namespace platform

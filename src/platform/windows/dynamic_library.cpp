@@ -6,13 +6,13 @@ namespace platform {
 
 void* loadLibrary(const std::string& path, std::string& error) {
     HMODULE library = LoadLibraryA(path.c_str());
-    if (!library) error = "LoadLibraryA: " + lastErrorText();
+    if (!library) error = lastErrorText();
     return reinterpret_cast<void*>(library);
 }
 
 void* findSymbol(void* library, const char* name, std::string& error) {
     FARPROC symbol = GetProcAddress(static_cast<HMODULE>(library), name);
-    if (!symbol) error = "GetProcAddress: " + lastErrorText();
+    if (!symbol) error = lastErrorText();
     return reinterpret_cast<void*>(symbol);
 }
 

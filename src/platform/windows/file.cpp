@@ -1,5 +1,6 @@
 // The configuration file: byte-range locks (LockFileEx) and the crash-safe replace.
 #include "platform/platform.h"
+#include "platform/common.h"
 #include "platform/windows/windows.h"
 
 #include <algorithm>
@@ -51,11 +52,6 @@ bool othersWait(HANDLE file) noexcept {
     return false;
 }
 
-// A pause between two tries of a waiter: 0.5 to 1.5 ms, drawn anew each time.
-std::chrono::microseconds nextLockPause() noexcept {
-    thread_local std::minstd_rand draw(GetCurrentThreadId() ^ GetCurrentProcessId());
-    return std::chrono::microseconds(500 + draw() % 1000);
-}
 
 OsError writeAll(HANDLE file, const char* data, std::size_t size) noexcept {
     for (ULONGLONG offset = 0; size > 0;) {
@@ -76,17 +72,6 @@ OsError identityOf(HANDLE file, BY_HANDLE_FILE_INFORMATION& information) noexcep
     return {};
 }
 
-// Removes the temporary files that writers of `name` in `folder` left when they were killed before
-// their rename ("." + name + "." and six characters, as replace() makes them). Only a writer that
-// holds the file's lock makes one, so while the lock is held every such file is a leftover.
-void removeLeftovers(const std::string& folder, const std::string& name) {
-    const std::string prefix = "." + name + ".";
-    std::vector<std::string> names;
-    if (listFolder(folder, names) != 0) return;  // they stay until a later write
-    for (const std::string& entry : names)
-        if (entry.size() == prefix.size() + 6 && entry.compare(0, prefix.size(), prefix) == 0)
-            DeleteFileA((folder + "\\" + entry).c_str());
-}
 
 // A new file of a hidden name of its own ("." + name + "." and six characters) in `folder`.
 HANDLE createTemporary(const std::string& folder, const std::string& name, std::string& path, DWORD& error) {
@@ -174,7 +159,8 @@ OsError File::namesPath(bool& same) noexcept {
     same = false;
     BY_HANDLE_FILE_INFORMATION opened{}, named{};
     if (OsError error = identityOf(handleOf(_descriptor), opened)) return error;
-    const HANDLE file = CreateFileA(_path.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, FILE_FLAG_BACKUP_SEMANTICS, nullptr);
+    const HANDLE file =
+        CreateFileA(_path.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, FILE_FLAG_BACKUP_SEMANTICS, nullptr);
     if (file == INVALID_HANDLE_VALUE) {
         const DWORD error = GetLastError();
         if (error == ERROR_FILE_NOT_FOUND) return {};  // removed: the path names no file at all

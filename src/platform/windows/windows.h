@@ -21,8 +21,6 @@ std::string lastErrorText();
 // The whole content of an open file from its start; a file longer than `limit` bytes is not
 // read: ERROR_FILE_TOO_LARGE, nothing kept. 0 or the error code.
 int readWhole(HANDLE file, std::size_t limit, std::string& text);
-// The names in a folder, sorted, without "." and ".."; 0 or the error code.
-int listFolder(const std::string& path, std::vector<std::string>& names);
 
 // Windows handles of kernel objects fit in 32 bits, in 64-bit processes too (so that 32-bit and
 // 64-bit processes can share them); the platform layer keeps a file's handle where Unix keeps its
