@@ -56,7 +56,7 @@ ViStatus expectedFor(const std::string& name, const std::string& kind) {
 }
 
 TEST(Stdcall, EveryExportByItsOrdinalRemovesItsArgumentsAndAnswers) {
-    const HMODULE dll = GetModuleHandleA("tiktal.dll");
+    const HMODULE dll = LoadLibraryA("tiktal.dll");
     ASSERT_NE(dll, nullptr);
     int exports = 0;
 #define TIKTAL_EXPORT_ORDINAL(ordinal, name, kind)                                                              \

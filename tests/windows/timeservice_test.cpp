@@ -8,11 +8,13 @@
 #include <winsock2.h>
 #include <ws2tcpip.h>
 
+#include <cjson/cJSON.h>
 #include <gtest/gtest.h>
 #include <tiktal/tiktal.h>
 
 #include <cstdlib>
 #include <fstream>
+#include <memory>
 #include <sstream>
 #include <string>
 
@@ -82,7 +84,7 @@ TEST(TimeServiceUnderWine, ReadsAndWritesAttributesOfEachType) {
     ASSERT_EQ(session.status(), VI_SUCCESS);
     const ViSession vi = session.vi();
     char names[64];
-    EXPECT_EQ(tiktal_GetTimeReferenceNames(vi, 0, nullptr), 17);
+    EXPECT_EQ(tiktal_GetTimeReferenceNames(vi, 0, nullptr), 18);
     EXPECT_EQ(tiktal_GetTimeReferenceNames(vi, sizeof names, names), VI_SUCCESS);
     EXPECT_STREQ(names, "PTP1,BC1,AS1,TAB1");
     EXPECT_EQ(text(vi, "PTP1", TIKTAL_ATTR_1588_CLOCK_ID), "00:80:2F:FF:FE:12:34:56");
@@ -102,7 +104,6 @@ TEST(TimeServiceUnderWine, ReadsAndWritesAttributesOfEachType) {
     EXPECT_EQ(tiktal_GetAttributeViBoolean(vi, "TAB1", TIKTAL_ATTR_TIME_REFERENCE_ENABLED, &enabled), VI_SUCCESS);
     EXPECT_EQ(enabled, VI_TRUE);
     EXPECT_EQ(tiktal_GetAttributeViInt32(vi, "AS1", TIKTAL_ATTR_1588_GM_PRIORITY1, &priority), tiktalerr_trTypeMismatch);
-    EXPECT_EQ(control("GET", "/_sim/last").find(R"("path":"/tiktalwebs/sync_1/AS1/type")"), 1u);
 }
 
 TEST(TimeServiceUnderWine, ReadsTheTimeAndPersists) {
@@ -118,13 +119,12 @@ TEST(TimeServiceUnderWine, ReadsTheTimeAndPersists) {
 
     EXPECT_EQ(tiktal_SetAttributeViInt32(session.vi(), "BC1", TIKTAL_ATTR_1588_PRIORITY2, 99), VI_SUCCESS);
     EXPECT_EQ(tiktal_PersistConfig(session.vi()), VI_SUCCESS);
-    std::ifstream state(environment("TIKTAL_TEST_TIMESERVICE_STATE"));
-    std::stringstream persisted;
-    persisted << state.rdbuf();
-    const std::string file = persisted.str();
-    const std::size_t bc1 = file.find("\"BC1\"");
-    ASSERT_NE(bc1, std::string::npos) << file;
-    EXPECT_NE(file.find("\"priority2\": 99", bc1), std::string::npos) << file;
+    std::ifstream file(environment("TIKTAL_TEST_TIMESERVICE_STATE"));
+    std::stringstream text;
+    text << file.rdbuf();
+    const std::unique_ptr<cJSON, decltype(&cJSON_Delete)> state(cJSON_Parse(text.str().c_str()), cJSON_Delete);
+    const cJSON* bc1 = cJSON_GetObjectItemCaseSensitive(cJSON_GetObjectItemCaseSensitive(state.get(), "timeReferences"), "BC1");
+    EXPECT_EQ(cJSON_GetNumberValue(cJSON_GetObjectItemCaseSensitive(bc1, "priority2")), 99) << text.str();
 }
 
 TEST(TimeServiceUnderWine, FailuresOfTheServiceAndOfTheConnection) {
