@@ -11,10 +11,10 @@ packages=(
   libgtest-dev libgmock-dev libbenchmark-dev
   libcjson-dev libcurl4-openssl-dev libboost-dev libcpp-httplib-dev libcli11-dev
 )
-# The Windows build: the mingw-w64 cross compilers, Wine to run what they build (32-bit, from the
-# i386 architecture, and 64-bit, for kernels that run no 32-bit programs), and dpkg-dev (apt-get
-# source, dpkg-source) and make to cross-build cJSON and libcurl from Debian's source packages.
-# Installed without the recommended packages.
+# The Windows build: the mingw-w64 cross compilers, Wine (32-bit from the i386 architecture, and
+# 64-bit) to run what they build, and dpkg-dev (apt-get source, dpkg-source) and make to
+# cross-build cJSON and libcurl from Debian's source packages. Installed without the recommended
+# packages.
 windows_packages=(mingw-w64 wine wine32:i386 wine64 dpkg-dev make)
 
 missing() {
