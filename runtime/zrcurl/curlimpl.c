@@ -4,31 +4,29 @@
  * Most entry points carry libcurl's own names, so this library does not link libcurl. If it did,
  * its call to libcurl's curl_easy_init could bind to its own curl_easy_init whenever the program
  * itself does not provide the name (the dynamic linker then searches this library before its
- * dependencies) and call itself forever. Instead libcurl is opened once with dlopen, and every
- * entry point calls through a pointer looked up on that handle. Without libcurl the entry points
+ * dependencies) and call itself forever. Instead libcurl is opened once at run time (libcurl_open.h),
+ * and every entry point calls through a pointer looked up in it. Without libcurl the entry points
  * return failure values: CURLE_FAILED_INIT, CURLM_INTERNAL_ERROR, CURLSHE_NOT_BUILT_IN,
  * CURL_FORMADD_DISABLED, a null pointer, or a fixed text for the strerror functions.
  *
  * Build choices by compile definition:
- *   ZRCURL_LIBCURL_NAME             the file opened (default "libcurl.so.4", the system libcurl);
+ *   ZRCURL_LIBCURL_NAME             the file opened (see libcurl_open.h);
  *   ZRCURL_WITHOUT_SHARE_SETOPT     a broken build for the loading tests: zrcurl_share_setopt is
  *                                   left out, so one of the 43 names is missing.
  */
 #define CURL_ALLOW_OLD_MULTI_SOCKET /* curl_multi_socket stays a function, not a macro */
 
+#include "zrcurl/libcurl_open.h"
 #include "zrcurl/zrcurl.h"
 #include "zrcurl/zrcurl_entries.h"
 
-#include <dlfcn.h>
 #include <pthread.h>
 #include <stdint.h>
 #include <stdlib.h>
 
-#ifndef ZRCURL_LIBCURL_NAME
-#define ZRCURL_LIBCURL_NAME "libcurl.so.4"
-#endif
-
+#ifndef ZRCURL_EXPORT
 #define ZRCURL_EXPORT __attribute__((visibility("default")))
+#endif
 
 static pthread_once_t libcurl_once = PTHREAD_ONCE_INIT;
 static void open_libcurl(void);
@@ -47,18 +45,19 @@ static CURLFORMcode (*real_formadd)(struct curl_httppost**, struct curl_httppost
 
 static void open_libcurl(void) {
   /* Never closed: the entry points may be called until the process ends. */
-  void* libcurl = dlopen(ZRCURL_LIBCURL_NAME, RTLD_NOW | RTLD_LOCAL);
+  void* libcurl = libcurl_open();
   if (libcurl == NULL) {
     return;
   }
-#define FIND_REAL(type, name, params, args, failure) real_##name = (type(*) params)dlsym(libcurl, #name);
-#define FIND_REAL_VOID(name, params, args) real_##name = (void(*) params)dlsym(libcurl, #name);
+#define FIND_REAL(type, name, params, args, failure) real_##name = (type(*) params)libcurl_function(libcurl, #name);
+#define FIND_REAL_VOID(name, params, args) real_##name = (void(*) params)libcurl_function(libcurl, #name);
   ZRCURL_TABLE(FIND_REAL, FIND_REAL_VOID, NOTHING_FOR_VARIADIC)
-  real_easy_setopt = (CURLcode(*)(CURL*, CURLoption, ...))dlsym(libcurl, "curl_easy_setopt");
-  real_easy_getinfo = (CURLcode(*)(CURL*, CURLINFO, ...))dlsym(libcurl, "curl_easy_getinfo");
-  real_multi_setopt = (CURLMcode(*)(CURLM*, CURLMoption, ...))dlsym(libcurl, "curl_multi_setopt");
-  real_share_setopt = (CURLSHcode(*)(CURLSH*, CURLSHoption, ...))dlsym(libcurl, "curl_share_setopt");
-  real_formadd = (CURLFORMcode(*)(struct curl_httppost**, struct curl_httppost**, ...))dlsym(libcurl, "curl_formadd");
+  real_easy_setopt = (CURLcode(*)(CURL*, CURLoption, ...))libcurl_function(libcurl, "curl_easy_setopt");
+  real_easy_getinfo = (CURLcode(*)(CURL*, CURLINFO, ...))libcurl_function(libcurl, "curl_easy_getinfo");
+  real_multi_setopt = (CURLMcode(*)(CURLM*, CURLMoption, ...))libcurl_function(libcurl, "curl_multi_setopt");
+  real_share_setopt = (CURLSHcode(*)(CURLSH*, CURLSHoption, ...))libcurl_function(libcurl, "curl_share_setopt");
+  real_formadd =
+      (CURLFORMcode(*)(struct curl_httppost**, struct curl_httppost**, ...))libcurl_function(libcurl, "curl_formadd");
 }
 
 /* The forwarders: open libcurl on the first call, then pass the arguments on unchanged. */

@@ -18,7 +18,9 @@
 
 #include <curl/curl.h>
 
+#ifndef ZRSSLINIT_EXPORT
 #define ZRSSLINIT_EXPORT __attribute__((visibility("default")))
+#endif
 
 /* What Init hands out: one reference on the global state, given back by Uninit. */
 struct zrsslinit_handle {

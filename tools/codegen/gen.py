@@ -205,15 +205,77 @@ extern "C" {{
 """
 
 
-def gen_exports(exports, extra_names=()):
+def takes_vi(e):
+    """Whether vi comes first, before the parameters the table lists: for all but the SetGVRT
+    functions and the opening functions, whose vi (an output) the table lists."""
+    return not e["name"].startswith("SetGVRT") and "vi" not in [n for _, n in e["params"]]
+
+
+def argument_words(types):
+    """The 32-bit words the arguments of these C types take on a 32-bit stack."""
+    return sum(2 if t.replace("const ", "").strip() in ("ViReal64", "ViUInt64", "double") else 1 for t in types)
+
+
+def export_words(e):
+    return argument_words([t for t, _ in e["params"]]) + (1 if takes_vi(e) else 0)
+
+
+def cjson_param_types(params):
+    return [] if params.strip() == "void" else [re.sub(r"\s*\w+$", "", p.strip()) for p in params.split(",")]
+
+
+def shared_body(e):
+    """The body a stub or a zero export shares on Windows with those of the same kind and argument
+    words (their bodies read no argument); None for the others."""
+    if e["kind"] not in ("stub", "zero"):
+        return None
+    return f"tiktal{e['kind'].capitalize()}{export_words(e)}Words"
+
+
+def gen_shared_bodies(exports):
+    groups = {(e["kind"], export_words(e)): shared_body(e) for e in exports if shared_body(e)}
+    defs = []
+    for (kind, words), name in sorted(groups.items()):
+        result = "tiktalerr_featureNotSupported" if kind == "stub" else "VI_SUCCESS"
+        defs.append(f"ViStatus _VI_FUNC {name}({', '.join(['ViUInt32'] * words)}) {{\n    return {result};\n}}\n")
+    return defs
+
+
+def gen_module_definition(exports, cjson, arch):
+    """The module definition of tiktal.dll for `arch` (i686 or x86_64): the numbered exports with
+    their ordinals, the others, then cJSON's functions. On i686 the functions are __stdcall and
+    named name@bytes, bytes = 4 x argument words; the DLL is linked with --kill-at, which exports
+    them undecorated, and the import libraries keep the decorated names that callers reference."""
+    def decorated(name, words):
+        return f"{name}@{4 * words}" if arch == "i686" else name
+
+    lines = []
+    for e in sorted(exports, key=lambda e: e["ordinal"] == "-"):
+        words = export_words(e)
+        line = decorated(e["name"], words)
+        if shared_body(e):
+            line += " = " + decorated(shared_body(e), words)
+        if e["ordinal"] != "-":
+            line += f" @{e['ordinal']}"
+        lines.append(line)
+    lines += [decorated(name, argument_words(cjson_param_types(params))) for _, name, params in cjson]
+    return "LIBRARY tiktal.dll\nEXPORTS\n" + "".join(f"    {line}\n" for line in lines)
+
+
+def gen_exports(exports, cjson=(), windows_arch=None):
+    """The exports' source, the version script, the module definition and the list of names. For
+    Windows (windows_arch set) the stubs and the zero exports share bodies, which the module
+    definition exports under each name, and cJSON's functions are exported from the static cJSON."""
     defs = []
     for e in exports:
-        if e["kind"] == "manual":
+        if e["kind"] == "manual" or (windows_arch and shared_body(e)):
             continue
         used = e["kind"] in ("forward", "text")
         params = [("ViSession", "vi")] + e["params"]
         sig = ", ".join(t + (" " + n if used else "") for t, n in params)
         defs.append(f"ViStatus _VI_FUNC {e['name']}({sig}) {{\n    {export_body(e)}\n}}\n")
+    if windows_arch:
+        defs += gen_shared_bodies(exports)
     source = f"""// Generated from src/tables/exports.tsv: the forwarding exports, the stubs, and the exports
 // that return 0.
 #include "api/frame.h"
@@ -223,11 +285,14 @@ extern "C" {{
 {chr(10).join(defs)}
 }}  // extern "C"
 """
-    names = [e["name"] for e in exports] + list(extra_names)
+    names = [e["name"] for e in exports] + [name for _, name, _ in cjson]
     version_script = "{\n  global:\n" + "".join(f"    {n};\n" for n in names) + "  local: *;\n};\n"
-    numbered = [e for e in exports if e["ordinal"] != "-"]
-    module_def = "LIBRARY tiktal\nEXPORTS\n" + "".join(f"    {e['name']} @{e['ordinal']}\n" for e in numbered) + \
-        "".join(f"    {e['name']}\n" for e in exports if e["ordinal"] == "-")
+    if windows_arch:
+        module_def = gen_module_definition(exports, cjson, windows_arch)
+    else:
+        numbered = [e for e in exports if e["ordinal"] != "-"]
+        module_def = "LIBRARY tiktal\nEXPORTS\n" + "".join(f"    {e['name']} @{e['ordinal']}\n" for e in numbered) + \
+            "".join(f"    {e['name']}\n" for e in exports if e["ordinal"] == "-")
     return source, version_script, module_def, "\n".join(names) + "\n"
 
 
@@ -835,6 +900,8 @@ def main():
     parser.add_argument("--tables", required=True)
     parser.add_argument("--out", required=True)
     parser.add_argument("--cjson-header", help="cJSON's header, whose functions the library exports too")
+    parser.add_argument("--windows", choices=("i686", "x86_64"),
+                        help="write the exports for tiktal.dll of this architecture")
     args = parser.parse_args()
     ops, exports, statuses = load(args.tables)
     os.makedirs(args.out, exist_ok=True)
@@ -843,7 +910,7 @@ def main():
     files["SessionDebugPrintOnly.h"], files["SessionDebugPrintOnly.cpp"] = gen_trace_session(ops)
     cjson = read_cjson_functions(args.cjson_header)
     files["apiFunctions.cpp"], files["exports.map"], files["tiktal.def"], files["exports.txt"] = gen_exports(
-        exports, [name for _, name, _ in cjson])
+        exports, cjson, args.windows)
     files["cjsonForwarders.cpp"] = gen_cjson_forwarders(cjson)
     files["statusTable.inc"] = gen_status_table(statuses)
     files["HorloApiAttrDict.inc"] = gen_attribute_dictionary(args.tables)
