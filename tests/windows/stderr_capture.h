@@ -1,7 +1,7 @@
 // Capture of the trace for tests on Windows, where the library hands its lines to the debug
 // output (OutputDebugStringA) instead of standard error. OutputDebugStringA raises the exception
-// DBG_PRINTEXCEPTION_C with the text; a vectored handler sees it first, before any debugger
-// would, so the test collects each line whole, in the order the calls made them.
+// DBG_PRINTEXCEPTION_C with the text; in a process without a debugger a vectored handler sees it
+// first, so the test collects each line whole, in the order the calls made them.
 #pragma once
 
 #ifndef WIN32_LEAN_AND_MEAN
