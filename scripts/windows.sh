@@ -16,7 +16,7 @@ for build in "${builds[@]}"; do
   echo "== $dir ($arch-w64-mingw32)"
   scripts/windows/deps.sh "$arch" "$deps"
   cmake -S . -B "$dir" -G Ninja -DCMAKE_TOOLCHAIN_FILE="cmake/toolchains/$arch-w64-mingw32.cmake" \
-    -DTIKTAL_WINDOWS_DEPS="$deps" -DTIKTAL_TESTS=OFF -DTIKTAL_BENCH=OFF >/dev/null
+    -DTIKTAL_WINDOWS_DEPS="$deps" -DTIKTAL_BENCH=OFF >/dev/null
   cmake --build "$dir" -j "$jobs"
 done
 
@@ -24,6 +24,6 @@ for build in "${builds[@]}"; do
   dir=${build#*:}
   if [ -f "$dir/windows-tests.sh" ]; then
     echo "== Windows tests of $dir"
-    bash "$dir/windows-tests.sh"
+    bash "$dir/windows-tests.sh" || [ $? -eq 77 ]  # 77: Wine cannot run this architecture here
   fi
 done

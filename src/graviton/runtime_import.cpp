@@ -19,8 +19,9 @@ void* findRuntimeModule() noexcept {
     if (void* module = platform::threadModule(gThreadIndex.load())) return module;
     if (void* module = gModule.load()) return module;
     if (void* program = platform::mainProgramDefining({"gGVRTVersion", "AZNewHandle"})) return program;
-    if (void* library = platform::loadedLibrary("libgrrt.so")) return library;
-    return platform::loadedLibrary("libgrffrt.so");
+    static const std::string grrt = platform::libraryFileName("grrt"), grffrt = platform::libraryFileName("grffrt");
+    if (void* library = platform::loadedLibrary(grrt.c_str())) return library;
+    return platform::loadedLibrary(grffrt.c_str());
 }
 
 void* RuntimeImport::resolve() noexcept {

@@ -15,7 +15,8 @@ void setThreadIndex(std::uint32_t index) noexcept;
 
 // The run-time module of the calling thread, first match wins: the module in the thread's slot,
 // the module set by the environment, the main program when it is the environment (it defines
-// "gGVRTVersion" or "AZNewHandle"), then libgrrt.so or libgrffrt.so when loaded. Null when none.
+// "gGVRTVersion" or "AZNewHandle"), then the library grrt or grffrt (libgrrt.so, grrt.dll) when
+// loaded. Null when none.
 void* findRuntimeModule() noexcept;
 
 // One imported function with its cache: eight entries, one per run-time module, claimed with a

@@ -48,7 +48,7 @@ void writeDebugOutput(const char* line, std::size_t length) noexcept;
 // Shared libraries loaded at run time. Failures return null and describe themselves in `error`,
 // the text of the system call named by kLoadLibraryApi or kFindSymbolApi.
 #if defined(_WIN32)
-constexpr char kLoadLibraryApi[] = "LoadLibraryA";
+constexpr char kLoadLibraryApi[] = "LoadLibraryExA";
 constexpr char kFindSymbolApi[] = "GetProcAddress";
 #else
 constexpr char kLoadLibraryApi[] = "dlerror";

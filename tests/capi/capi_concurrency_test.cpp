@@ -1,85 +1,22 @@
 // Sessions used from several threads at once. These also run alone under ThreadSanitizer
 // (ctest -L concurrency).
 //
-// To catch a thread inside the library deterministically, fd 2 becomes a pipe of one page that
-// is filled so that only the first trace line of a call fits: the thread then blocks in write(2)
-// on its second line, inside the session operation, until the pipe is read.
-#include <sys/ioctl.h>
-
+// To catch a thread inside the library deterministically, the thread is held while it writes
+// its second trace line, inside the session operation (trace_block.h).
 #include <atomic>
 #include <chrono>
 #include <future>
 #include <mutex>
 #include <set>
-#include <stdexcept>
 
 #include "capi_support.h"
+#include "trace_block.h"
 
 namespace {
 
 using namespace capi;
 using namespace std::chrono_literals;
-
-// Polls `done` until it holds; false after 10 s, so that a fault fails the test instead of hanging it.
-template <class Done>
-bool waitUntil(Done&& done) {
-    const auto deadline = std::chrono::steady_clock::now() + 10s;
-    while (!done()) {
-        if (std::chrono::steady_clock::now() > deadline) return false;
-        std::this_thread::yield();
-    }
-    return true;
-}
-
-// Runs `blocked` on a thread of its own with fd 2 a pipe of one page that has room for its first
-// trace line only (`firstLineSize` bytes). Once that line is in the pipe, the thread is inside the
-// library, blocked writing its next line; then `meanwhile` runs (on another thread, given up after
-// 10 s) and afterwards the pipe is read so that `blocked` can finish. Returns the trace messages
-// that `blocked` and `meanwhile` wrote.
-template <class Blocked, class Meanwhile>
-std::vector<std::string> whileBlockedInTrace(std::size_t firstLineSize, Blocked&& blocked, Meanwhile&& meanwhile) {
-    int ends[2];
-    if (::pipe2(ends, O_CLOEXEC) != 0) throw std::system_error(errno, std::generic_category(), "pipe2");
-    const int capacity = ::fcntl(ends[1], F_SETPIPE_SZ, 4096);  // rounded up to one page
-    if (capacity <= static_cast<int>(firstLineSize)) throw std::runtime_error("cannot make a pipe of one page");
-    const std::string filler(static_cast<std::size_t>(capacity) - firstLineSize, '#');
-    EXPECT_EQ(::write(ends[1], filler.data(), filler.size()), static_cast<ssize_t>(filler.size()));
-    std::optional<Fd2Redirect> redirect(std::in_place, ends[1]);
-    ::close(ends[1]);  // fd 2 is now the only writing end
-
-    std::thread thread(blocked);
-    std::future<void> other;
-    const auto full = [&] {
-        int buffered = 0;
-        return ::ioctl(ends[0], FIONREAD, &buffered) == 0 && buffered == capacity;
-    };
-    if (!waitUntil(full)) {
-        ADD_FAILURE() << "the first trace line never arrived";
-    } else {
-        other = std::async(std::launch::async, meanwhile);
-        if (other.wait_for(10s) != std::future_status::ready)
-            ADD_FAILURE() << "the calls made meanwhile waited for the blocked thread";
-    }
-    std::string output;
-    std::thread reader([&] {
-        char buffer[4096];
-        for (ssize_t n; (n = ::read(ends[0], buffer, sizeof buffer)) != 0;)
-            if (n > 0) output.append(buffer, static_cast<std::size_t>(n));
-            else if (errno != EINTR) return;
-    });
-    thread.join();
-    if (other.valid()) other.get();
-    redirect.reset();  // end of file for the reader
-    reader.join();
-    ::close(ends[0]);
-
-    std::vector<std::string> lines;
-    for (std::size_t at = filler.size(), end; at < output.size(); at = end) {
-        end = std::min(output.find('\n', at), output.size() - 1) + 1;
-        lines.push_back(output.substr(at, end - at));
-    }
-    return traceMessages(lines);
-}
+using testsupport::whileBlockedInTrace;
 
 TEST(Concurrency, CloseDuringACallEndsTheSessionWhenTheCallReturns) {
     const ViSession vi = openTraceSession();
@@ -90,13 +27,13 @@ TEST(Concurrency, CloseDuringACallEndsTheSessionWhenTheCallReturns) {
     ASSERT_EQ(probeWrites.size(), 7u);
 
     ViStatus callStatus = -1;
-    const std::vector<std::string> trace = whileBlockedInTrace(
+    const std::vector<std::string> trace = traceMessages(whileBlockedInTrace(
         probeWrites[0].size(), [&] { callStatus = call(); },
         [vi] {
             EXPECT_EQ(tiktal_close(vi), VI_SUCCESS);
             EXPECT_EQ(tiktal_reset(vi), tiktalerr_invalidObject);
             EXPECT_EQ(tiktal_close(vi), VI_SUCCESS);
-        });
+        }));
     EXPECT_EQ(callStatus, VI_SUCCESS);
     // The call ran to its end on the session, which was destroyed only then.
     std::vector<std::string> expected = {"{ " + kTraced + "connectTrigTerminals", "srcTerminal: PXI_Trig0",
@@ -121,7 +58,7 @@ TEST(Concurrency, LookupsWaitForTheDestructorOfAClosedSession) {
     const std::vector<ViSession> others = {openTraceSession(), openTraceSession(), openTraceSession()};
     std::vector<std::future<ViStatus>> lookups;  // self tests on `others` (not traced), then an unknown handle
     ViStatus closeStatus = -1;
-    const std::vector<std::string> trace = whileBlockedInTrace(
+    const std::vector<std::string> trace = traceMessages(whileBlockedInTrace(
         probeWrites[0].size(), [&] { closeStatus = tiktal_close(closing); },
         [&] {
             for (const ViSession vi : others)
@@ -134,7 +71,7 @@ TEST(Concurrency, LookupsWaitForTheDestructorOfAClosedSession) {
             std::this_thread::sleep_for(200ms);
             for (const std::future<ViStatus>& lookup : lookups)
                 EXPECT_EQ(lookup.wait_for(0s), std::future_status::timeout) << "a call went ahead of the destructor";
-        });
+        }));
     EXPECT_EQ(closeStatus, VI_SUCCESS);
     EXPECT_EQ(trace, (std::vector<std::string>{"{ " + kTraced + "~SessionDebugPrintOnly",
                                                "} " + kTraced + "~SessionDebugPrintOnly"}));

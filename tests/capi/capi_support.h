@@ -18,7 +18,6 @@
 
 namespace capi {
 
-using testsupport::Fd2Redirect;
 using testsupport::QuietStderr;
 using testsupport::StderrCapture;
 
@@ -27,7 +26,7 @@ inline const std::string kTraced = "tiktal::SessionDebugPrintOnly::";
 
 // Calls `function` with `vi` and every other parameter null or zero.
 template <class... Params>
-ViStatus callWithZeros(ViStatus (*function)(ViSession, Params...), ViSession vi) {
+ViStatus callWithZeros(ViStatus(_VI_FUNC* function)(ViSession, Params...), ViSession vi) {
     return function(vi, Params{}...);
 }
 

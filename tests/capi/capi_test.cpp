@@ -194,7 +194,8 @@ const std::pair<const char*, TextFunction> kTextFunctions[] = {
      [](ViSession vi, ViInt32 size, ViChar* buffer) {
          return tiktal_GetAttributeViString(vi, "", TIKTAL_ATTR_1588_CLOCK_ID, size, buffer);
      }},
-    {"tiktal_GetTimeReferenceNames", &tiktal_GetTimeReferenceNames},
+    {"tiktal_GetTimeReferenceNames",
+     [](ViSession vi, ViInt32 size, ViChar* buffer) { return tiktal_GetTimeReferenceNames(vi, size, buffer); }},
 };
 
 TEST(TextOutputs, SizeQueryAndBufferRulesOnTheEmptyText) {
@@ -357,7 +358,7 @@ TEST(Trace, ALongTextIsCutToOneWholeLine) {
     const std::vector<std::string> writes = capture.finish();
     const std::vector<std::string> trace = traceMessages(writes);
     ASSERT_EQ(trace.size(), 3u);
-    EXPECT_LE(writes[1].size(), static_cast<std::size_t>(PIPE_BUF));  // written whole even to a shared pipe
+    EXPECT_LE(writes[1].size(), testsupport::kWholeWriteLimit);  // written whole even to a shared pipe
     EXPECT_EQ(trace[1].rfind("terminal: AAAA", 0), 0u);
     EXPECT_EQ(trace[2], "} " + kTraced + "clearClock");
     closeQuietly(vi);

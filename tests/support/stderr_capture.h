@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <climits>
 #include <cerrno>
 #include <optional>
 #include <string>
@@ -14,6 +15,9 @@
 #include <vector>
 
 namespace testsupport {
+
+// The longest write that reaches a reader of a shared pipe whole.
+inline constexpr std::size_t kWholeWriteLimit = PIPE_BUF;
 
 // Points fd 2 at `fd` until restore() or destruction.
 class Fd2Redirect {

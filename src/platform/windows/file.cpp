@@ -93,6 +93,16 @@ HANDLE createTemporary(const std::string& folder, const std::string& name, std::
 // the folder's entries, or that another process holds the file in a way that forbids the rename.
 bool mayNotReplace(DWORD error) noexcept { return error == ERROR_ACCESS_DENIED || error == ERROR_SHARING_VIOLATION; }
 
+// Whether every folder on the way to `path` that exists is a folder: then ERROR_PATH_NOT_FOUND
+// means that one is missing, which other systems tell apart from a file in the way.
+bool onlyFoldersOnTheWay(const std::string& path) {
+    for (std::size_t end = path.find_first_of("/\\"); end != std::string::npos; end = path.find_first_of("/\\", end + 1)) {
+        const DWORD attributes = GetFileAttributesA(path.substr(0, end).c_str());
+        if (attributes != INVALID_FILE_ATTRIBUTES && !(attributes & FILE_ATTRIBUTE_DIRECTORY)) return false;
+    }
+    return true;
+}
+
 }  // namespace
 
 File::~File() { close(); }
@@ -108,6 +118,7 @@ OsError File::open(const std::string& path, bool create) {
         const DWORD attributes = GetFileAttributesA(path.c_str());
         if (attributes != INVALID_FILE_ATTRIBUTES && (attributes & FILE_ATTRIBUTE_DIRECTORY))
             return {"CreateFileA", error::kIsAFolder};
+        if (error == ERROR_PATH_NOT_FOUND && onlyFoldersOnTheWay(path)) return {"CreateFileA", error::kNotFound};
         return {"CreateFileA", static_cast<int>(error)};
     }
     if (GetFileType(file) != FILE_TYPE_DISK) {
