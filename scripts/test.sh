@@ -1,8 +1,8 @@
 #!/usr/bin/env bash
 # Builds the library and runs every test: a normal build, then the Python package's tests (ctest's
 # python.package, run here on their own), a build under AddressSanitizer and
-# UndefinedBehaviorSanitizer, the concurrency tests under ThreadSanitizer, and a short run of every
-# fuzz target on its seed corpus.
+# UndefinedBehaviorSanitizer, the concurrency tests under ThreadSanitizer, a short run of every
+# fuzz target on its seed corpus, and the Windows build with its tests under Wine (scripts/windows.sh).
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
@@ -34,3 +34,6 @@ TSAN_OPTIONS="halt_on_error=1" ctest --test-dir build-tsan -L concurrency --outp
 
 echo "== fuzz targets (20000 inputs each)"
 scripts/fuzz.sh --runs 20000
+
+echo "== Windows: cross-built with mingw-w64, tested under Wine"
+scripts/windows.sh
