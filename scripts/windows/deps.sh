@@ -58,7 +58,9 @@ for p in "${packages[@]}"; do
   [ -n "$v" ] || { echo "deps: no source package $p" >&2; exit 1; }
   versions+=("$p $v")
 done
-stamp="$host ${versions[*]}"
+# A change to how they are built below changes the recipe, so that an older build is done again.
+recipe="recipe 2"
+stamp="$host ${versions[*]} $recipe"
 if [ "$(cat "$prefix/deps.stamp" 2>/dev/null)" = "$stamp" ]; then
   exit 0
 fi
@@ -91,13 +93,14 @@ mkdir -p "$build"
 read -r _ cjson_version <<<"${versions[0]}"
 read -r _ curl_version <<<"${versions[1]}"
 
-# cJSON, static; built so, its functions are not marked for export (the driver library's module
-# definition names the ones it exports).
+# cJSON, static; built so, its functions are not marked for export: every DLL that links it exports
+# only its own functions (the driver library's module definition names the cJSON ones it exports).
 cjson_src=$(unpack cjson "$cjson_version")
 logged "$build/cjson.log" cmake -S "$cjson_src" -B "$build/cjson" -G Ninja \
   -DCMAKE_TOOLCHAIN_FILE="$root/cmake/toolchains/$host.cmake" -DCMAKE_BUILD_TYPE=Release \
   -DCMAKE_INSTALL_PREFIX="$prefix" -DBUILD_SHARED_LIBS=OFF -DENABLE_CJSON_TEST=OFF -DENABLE_CJSON_UTILS=OFF \
-  -DENABLE_CUSTOM_COMPILER_FLAGS=OFF
+  -DENABLE_CUSTOM_COMPILER_FLAGS=OFF \
+  -DENABLE_PUBLIC_SYMBOLS=OFF -DENABLE_HIDDEN_SYMBOLS=ON
 logged "$build/cjson-build.log" cmake --build "$build/cjson" --target install
 
 # libcurl: HTTP and HTTPS only, TLS through Schannel, no other optional library; Windows' own

@@ -4,6 +4,7 @@
 
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <ctime>
 #include <mutex>
@@ -12,19 +13,17 @@
 namespace qpxisim {
 namespace {
 
-// What stat tells of a file; any write changes it, except a write of the same size within the
-// same tick of the file system's clock.
+// What stat tells of a file, to the second; any write changes it, except a write of the same size
+// within the same second. (Windows has no inode numbers: 0 for every file.)
 struct FileStamp {
     dev_t device = 0;
     ino_t inode = 0;
     off_t size = 0;
-    std::int64_t modified = 0, changed = 0;  // nanoseconds since the epoch
+    std::int64_t modified = 0, changed = 0;  // seconds since the epoch
 
     auto fields() const { return std::tie(device, inode, size, modified, changed); }
     bool operator==(const FileStamp& other) const { return fields() == other.fields(); }
 };
-
-std::int64_t nanoseconds(std::int64_t seconds, std::int64_t fraction) { return seconds * 1000000000 + fraction; }
 
 // Past this, a write gets another change time on any file system.
 constexpr std::int64_t kStampSettlesInSeconds = 2;
@@ -46,8 +45,7 @@ Cache& cache() {
 bool stampOf(const std::string& path, FileStamp& stamp) {
     struct stat status {};
     if (::stat(path.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) return false;
-    stamp = {status.st_dev, status.st_ino, status.st_size, nanoseconds(status.st_mtim.tv_sec, status.st_mtim.tv_nsec),
-             nanoseconds(status.st_ctim.tv_sec, status.st_ctim.tv_nsec)};
+    stamp = {status.st_dev, status.st_ino, status.st_size, status.st_mtime, status.st_ctime};
     return true;
 }
 
@@ -75,7 +73,8 @@ std::shared_ptr<const Inventory> readInventory(const std::string& path) {
     if (!readInventoryText(path, text)) return std::make_shared<const Inventory>();  // removed meanwhile
     keep(kept, path, std::move(text));
     kept.stamp = stamp;
-    kept.settled = stamp.changed / 1000000000 + kStampSettlesInSeconds < now;
+    // The later of the two times: on Windows the change time is the creation time.
+    kept.settled = std::max(stamp.modified, stamp.changed) + kStampSettlesInSeconds < now;
     return kept.inventory;
 }
 

@@ -1,7 +1,8 @@
 // Loading the run-time libraries of time-service sessions from the shared directory that the
 // registry value ZRSHAREDDIR names, under Wine: folders that lack the HTTP library, hold one
 // without a function the library needs, or one whose own libcurl is missing, fail the open as on
-// other systems, load nothing, and are tried again; the real folder then works for good.
+// other systems, load nothing, and are tried again; the real folder then works for good. And the
+// routing-service and PXI chassis query stand-ins, loaded by path, answer a call.
 #ifndef WIN32_LEAN_AND_MEAN
 #define WIN32_LEAN_AND_MEAN
 #endif
@@ -9,6 +10,9 @@
 
 #include <gtest/gtest.h>
 #include <tiktal/tiktal.h>
+
+#include "zrqpxi.h"
+#include "zrrocoapi.h"
 
 #include <cstdlib>
 #include <string>
@@ -44,6 +48,27 @@ std::string withoutLibcurl(const std::string& shared) {
 
 bool anyRuntimeLibraryLoaded() {
     return GetModuleHandleA("zrsslinit.dll") || GetModuleHandleA("curlimpl.dll") || GetModuleHandleA("libcurl-4.dll");
+}
+
+template <class Fn>
+Fn entry(HMODULE module, const char* name) {
+    return reinterpret_cast<Fn>(reinterpret_cast<void*>(GetProcAddress(module, name)));
+}
+
+TEST(Loading, TheRoutingAndPxiStandInsLoadAndOpenASession) {
+    const HMODULE roco = LoadLibraryA(TIKTAL_ROCO_DLL), qpxi = LoadLibraryA(TIKTAL_QPXI_DLL);
+    ASSERT_TRUE(roco && qpxi) << "LoadLibraryA: error " << GetLastError();
+    const auto createSession = entry<zrrocoapi_createImmediateSession_fn>(roco, "zrrocoapi_createImmediateSession");
+    const auto openSession = entry<zrqpxi_openPXISession_fn>(qpxi, "zrqpxi_openPXISession");
+    ASSERT_TRUE(createSession && openSession);
+    zrrocoapi_Status rocoStatus{};
+    EXPECT_NE(createSession(&rocoStatus), 0u);
+    EXPECT_EQ(rocoStatus.code, 0);
+    zrqpxi_Status qpxiStatus{};
+    EXPECT_NE(openSession(1, &qpxiStatus), 0u);
+    EXPECT_EQ(qpxiStatus.code, 0);
+    FreeLibrary(qpxi);
+    FreeLibrary(roco);
 }
 
 TEST(Loading, EveryBrokenFolderFailsAndLoadsNothingThenTheRealOneLoadsForGood) {
