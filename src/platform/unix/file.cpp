@@ -11,7 +11,6 @@
 #include <cerrno>
 #include <chrono>
 #include <cstdlib>
-#include <thread>
 
 namespace platform {
 
@@ -51,7 +50,6 @@ bool othersWait(int descriptor) noexcept {
     range.l_len = 1;
     return ::fcntl(descriptor, F_OFD_GETLK, &range) == 0 && range.l_type != F_UNLCK;
 }
-
 
 // Writes the whole of `data` from the start of the file.
 OsError writeAll(int descriptor, const char* data, std::size_t size) noexcept {
@@ -110,23 +108,11 @@ void File::close() noexcept {
 }
 
 // Tried again after short pauses rather than waited for in the kernel, whose wait only a signal
-// could end before the lock is free. While others wait, a newcomer does not try at once but
-// waits in line with them, each try after a pause of chance length.
+// could end before the lock is free.
 OsError File::lock(std::chrono::milliseconds limit) noexcept {
-    using Clock = std::chrono::steady_clock;
-    const Clock::time_point deadline = Clock::now() + limit;
-    OsError error{"fcntl", EAGAIN};
-    if (!othersWait(_descriptor)) error = setFileLock(_descriptor, F_WRLCK);
-    if (error.code == EAGAIN) {
-        // Failing to join the line only means that later comers do not see this waiter.
-        (void)setLock(_descriptor, F_RDLCK, kWaitersByte, 1);
-        for (Clock::time_point now = Clock::now(); error.code == EAGAIN && now < deadline; now = Clock::now()) {
-            std::this_thread::sleep_for(std::min<Clock::duration>(nextLockPause(), deadline - now));
-            error = setFileLock(_descriptor, F_WRLCK);
-        }
-        (void)setLock(_descriptor, F_UNLCK, kWaitersByte, 1);
-        if (error.code == EAGAIN) error = {"fcntl", ETIMEDOUT};
-    }
+    const OsError error = lockInTurn(
+        limit, {"fcntl", EAGAIN}, othersWait(_descriptor), [&] { return setFileLock(_descriptor, F_WRLCK); },
+        [&](bool join) { (void)setLock(_descriptor, join ? F_RDLCK : F_UNLCK, kWaitersByte, 1); });
     if (!error) _locked = true;
     return error;
 }

@@ -6,7 +6,6 @@
 #include <algorithm>
 #include <chrono>
 #include <random>
-#include <thread>
 
 namespace platform {
 namespace {
@@ -141,21 +140,15 @@ void File::close() noexcept {
 }
 
 OsError File::lock(std::chrono::milliseconds limit) noexcept {
-    using Clock = std::chrono::steady_clock;
     const HANDLE file = handleOf(_descriptor);
-    const Clock::time_point deadline = Clock::now() + limit;
-    OsError error{"LockFileEx", ERROR_LOCK_VIOLATION};
-    if (!othersWait(file)) error = setFileLock(file);
-    if (error.code == ERROR_LOCK_VIOLATION) {
-        const bool inLine = !setLock(file, false, kWaitersByte, 1);
-        for (Clock::time_point now = Clock::now(); error.code == ERROR_LOCK_VIOLATION && now < deadline;
-             now = Clock::now()) {
-            std::this_thread::sleep_for(std::min<Clock::duration>(nextLockPause(), deadline - now));
-            error = setFileLock(file);
-        }
-        if (inLine) clearLock(file, kWaitersByte, 1);
-        if (error.code == ERROR_LOCK_VIOLATION) error = {"LockFileEx", error::kTimedOut};
-    }
+    const OsError error = lockInTurn(
+        limit, {"LockFileEx", ERROR_LOCK_VIOLATION}, othersWait(file), [&] { return setFileLock(file); },
+        [&](bool join) {
+            if (join)
+                (void)setLock(file, false, kWaitersByte, 1);
+            else
+                (void)clearLock(file, kWaitersByte, 1);
+        });
     if (!error) _locked = true;
     return error;
 }
